@@ -1,0 +1,55 @@
+// Control API of the host stand-ins for the closed libraries.
+//
+// Every stand-in records each call (name, arguments as text, result) in one
+// process-wide record, in call order. Tests read the record, override the
+// result of a function, and seed the state the fakes keep. The same record
+// can be written as a text trace (docs/host-platform.md).
+#ifndef QUELLBORN_HOST_HOSTFAKES_H
+#define QUELLBORN_HOST_HOSTFAKES_H
+
+#include <string>
+#include <vector>
+
+#include "Mvd.h"
+
+namespace hostfakes {
+
+struct Call {
+    std::string name;
+    std::vector<std::string> args;
+    int result = 0;
+    // "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0"
+    std::string text() const;
+};
+
+// Forgets every recorded call, result override and fake state.
+void reset();
+
+std::vector<Call> calls();
+std::vector<std::string> callTexts();
+std::vector<std::string> callNames();
+// Calls recorded since position `from` (as text).
+std::vector<std::string> callTextsSince(size_t from);
+size_t callCount();
+
+// Makes every later call of `function` return `result` (and skip its effect,
+// as a failing library call would).
+void setResult(const std::string& function, int result);
+void clearResult(const std::string& function);
+
+// Writes every recorded call as a trace line to `target`: "stderr",
+// "stdout" or a file path (appended). Null or "" switches the trace off. The
+// environment variable QUELLBORN_TRACE sets the same at start-up.
+void setTrace(const char* target);
+
+// Media engine video streams: ids handed out by Mvd_Open start at 1.
+void setNextMvdStreamId(unsigned int id);
+// The codec record Mvd_GetCdc reports for an open stream; Mvd_SetCdc replaces it.
+void setMvdCodec(unsigned int streamId, const tagMVD_CODEC& codec);
+bool getMvdCodec(unsigned int streamId, tagMVD_CODEC* codec);
+// Streams that are open in the fake engine, ascending.
+std::vector<unsigned int> openMvdStreams();
+
+}  // namespace hostfakes
+
+#endif  // QUELLBORN_HOST_HOSTFAKES_H

@@ -1,0 +1,69 @@
+#include "LogCapture.h"
+
+#include <android/log.h>
+
+#include <condition_variable>
+#include <mutex>
+
+namespace {
+
+std::mutex gMutex;
+std::condition_variable gCond;
+std::vector<LogLine> gLines;
+
+void captureLogger(const struct __android_logger_data* data, const char* message) {
+    std::lock_guard<std::mutex> lock(gMutex);
+    gLines.push_back(LogLine{data->priority, data->tag != nullptr ? data->tag : "", message});
+    gCond.notify_all();
+}
+
+size_t countLocked(int priority, const std::string& tag, const std::string& text) {
+    size_t n = 0;
+    for (const LogLine& line : gLines) {
+        if (line.priority == priority && line.tag == tag && line.text == text) ++n;
+    }
+    return n;
+}
+
+}  // namespace
+
+LogCapture::LogCapture() {
+    clear();
+    __android_log_set_minimum_priority(ANDROID_LOG_VERBOSE);
+    __android_log_set_logger(captureLogger);
+}
+
+LogCapture::~LogCapture() {
+    __android_log_set_logger(__android_log_stderr_logger);
+    __android_log_set_minimum_priority(ANDROID_LOG_INFO);
+}
+
+std::vector<LogLine> LogCapture::lines() const {
+    std::lock_guard<std::mutex> lock(gMutex);
+    return gLines;
+}
+
+std::vector<LogLine> LogCapture::linesWithTag(const std::string& tag) const {
+    std::vector<LogLine> out;
+    for (const LogLine& line : lines()) {
+        if (line.tag == tag) out.push_back(line);
+    }
+    return out;
+}
+
+size_t LogCapture::count(int priority, const std::string& tag, const std::string& text) const {
+    std::lock_guard<std::mutex> lock(gMutex);
+    return countLocked(priority, tag, text);
+}
+
+bool LogCapture::waitFor(int priority, const std::string& tag, const std::string& text,
+                         size_t times, std::chrono::milliseconds timeout) const {
+    std::unique_lock<std::mutex> lock(gMutex);
+    return gCond.wait_for(lock, timeout,
+                          [&] { return countLocked(priority, tag, text) >= times; });
+}
+
+void LogCapture::clear() {
+    std::lock_guard<std::mutex> lock(gMutex);
+    gLines.clear();
+}

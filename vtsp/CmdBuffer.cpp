@@ -1,0 +1,137 @@
+#include "CmdBuffer.h"
+
+#include <android/log.h>
+
+#include <cstdio>
+#include <cstring>
+
+namespace android {
+
+namespace {
+
+constexpr const char* kTag = "cmdbuffer";
+constexpr size_t kDumpSize = 1024;
+
+// A default-constructed buffer holds no body; giving it a type that no
+// operation acts on keeps translate, compose and print from touching it.
+constexpr VPR_CommType kNoBody = static_cast<VPR_CommType>(0xFFFFFFFFu);
+
+uint32_t littleEndianIpv4(const uint8_t (&octets)[4]) {
+    return uint32_t(octets[0]) | uint32_t(octets[1]) << 8 | uint32_t(octets[2]) << 16 |
+           uint32_t(octets[3]) << 24;
+}
+
+}  // namespace
+
+std::atomic<int32_t> CmdBuffer::con{0};
+std::atomic<int32_t> CmdBuffer::des{0};
+
+CmdBuffer::CmdBuffer() : type(kNoBody), length(0), cmd{} {
+    ++con;
+}
+
+CmdBuffer::CmdBuffer(VPR_CommType type_, const unsigned char* bytes)
+        : type(type_), length(bodyLengthOf(type_)), cmd{} {
+    if (bytes == nullptr) length = 0;
+    memcpy(cmd, bytes == nullptr ? cmd : bytes, length);
+    ++con;
+}
+
+CmdBuffer::CmdBuffer(const CmdBuffer& other) : type(other.type), length(other.length), cmd{} {
+    memcpy(cmd, other.cmd, length);
+    ++con;
+}
+
+CmdBuffer& CmdBuffer::operator=(const CmdBuffer& other) {
+    if (this != &other) {
+        type = other.type;
+        length = other.length;
+        memcpy(cmd, other.cmd, length);
+    }
+    ++con;
+    return *this;
+}
+
+CmdBuffer::~CmdBuffer() {
+    const int32_t destroyed = ++des;
+    __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: %d/%d", "~CmdBuffer", destroyed, con.load());
+}
+
+void CmdBuffer::translate(bool toHost) {
+    if (toHost && type == VPR_COMM_VTSP_CMD) {
+        VtspStmVideoView& v = command().u.stmVideo;
+        swapAddress(v.localAddr);
+        swap16(v.localControlPort);
+        swapAddress(v.remoteAddr);
+        swap16(v.remoteControlPort);
+    } else if (!toHost && type == VPR_COMM_NET) {
+        swapAddress(reinterpret_cast<VprNetBind*>(cmd)->addr);
+    }
+}
+
+void CmdBuffer::compose(VPR_Comm* out) const {
+    memcpy(out->body, cmd, length);
+    if (type == VPR_COMM_NET) out->targetModule = VPMD_NET_TARGET;
+    out->recordLength = kVprCommSize;
+}
+
+void CmdBuffer::print() const {
+    if (type != VPR_COMM_VTSP_CMD) return;
+    const VtspCommand& c = command();
+    if (c.code < kFirstPrintedCode) return;
+
+    const VtspArgView& a = c.u.arg;
+    const VtspStmVideoView& v = c.u.stmVideo;
+    const OSAL_NetAddress& r = v.remoteAddr;
+    const OSAL_NetAddress& l = v.localAddr;
+    char uri[kExtmapUriSize + 1];
+    copyExtmapUri(v, uri);
+
+    char text[kDumpSize] = {};
+    snprintf(text, sizeof(text),
+             "VTSP Command: type %d, length %d  code: %d, infc: %d \n"
+             " arg0~6: %d %d %d %d %d %d %d\n"
+             " stmVideo: streamId %d dir %d encoder %d confMask 0x%x rdnDynType %d\n"
+             "           remoteAddr<ipv4 0x%x ipv6 0x%04x %04x %04x %04x %04x %04x %04x %04x, port %d, type: %d>\n"
+             "           remoteControlPort %d\n"
+             "           localAddr<ipv4 0x%x ipv6 0x%04x %04x %04x %04x %04x %04x %04x %04x, port %d, type: %d>\n"
+             "           localControlPort %d\n"
+             "           localVideoAsBwKbps %d Kbps\n"
+             "           remoteVideoAsBwKbps %d Kbps\n"
+             "           encodeType[0] %d, encodeType[1] %d\n"
+             "           rtp extension: extension %d, extmapId %d, extmapUri %s\n",
+             int(type), int(length), c.code, int(c.infc),
+             a.arg0, a.arg1, a.arg2, a.arg3, a.arg4, a.arg5, int(a.arg6),
+             int(v.streamId), int(v.dir), int(v.encoder), unsigned(v.confMask), int(v.rdnDynType),
+             unsigned(littleEndianIpv4(r.ipv4)), unsigned(r.ipv6[0]), unsigned(r.ipv6[1]),
+             unsigned(r.ipv6[2]), unsigned(r.ipv6[3]), unsigned(r.ipv6[4]), unsigned(r.ipv6[5]),
+             unsigned(r.ipv6[6]), unsigned(r.ipv6[7]), int(r.port), int(r.type),
+             int(v.remoteControlPort),
+             unsigned(littleEndianIpv4(l.ipv4)), unsigned(l.ipv6[0]), unsigned(l.ipv6[1]),
+             unsigned(l.ipv6[2]), unsigned(l.ipv6[3]), unsigned(l.ipv6[4]), unsigned(l.ipv6[5]),
+             unsigned(l.ipv6[6]), unsigned(l.ipv6[7]), int(l.port), int(l.type),
+             int(v.localControlPort),
+             int(v.localVideoAsBwKbps), int(v.remoteVideoAsBwKbps),
+             int(v.encodeType[0]), int(v.encodeType[1]),
+             int(v.extension), int(v.extmapId), uri);
+    __android_log_print(ANDROID_LOG_INFO, kTag, "%s", text);
+}
+
+void ConvertIpToString(char* out, const void* addr, bool ipv4) {
+    size_t used = 0;
+    if (ipv4) {
+        const uint8_t* octets = static_cast<const uint8_t*>(addr);
+        for (int i = 0; i < 4; ++i) {
+            used += snprintf(out + used, kIpTextSize - used, "%d.", int(octets[i]));
+        }
+    } else {
+        uint16_t groups[8];
+        memcpy(groups, addr, sizeof(groups));
+        for (uint16_t group : groups) {
+            used += snprintf(out + used, kIpTextSize - used, "%x:", unsigned(group));
+        }
+    }
+    out[used - 1] = '\0';  // drop the trailing separator
+}
+
+}  // namespace android

@@ -1,0 +1,113 @@
+#include "CmdCallbackMvd.h"
+
+#include <android/log.h>
+
+namespace android {
+
+namespace {
+
+constexpr const char* kTag = "CmdclbMVD";
+
+#define LOGD(...) __android_log_print(ANDROID_LOG_DEBUG, kTag, __VA_ARGS__)
+
+}  // namespace
+
+CmdCallbackMvd::CmdCallbackMvd(std::shared_ptr<CameraCodecParameter> table)
+        : mCameraCodecParameter(std::move(table)),
+          mCameraConfig(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS),
+          mCaptureId(kFrontCameraName) {}
+
+CmdCallbackMvd::~CmdCallbackMvd() {
+    mStreams.clear();
+}
+
+template <typename Fn>
+void CmdCallbackMvd::forEachStream(Fn fn) {
+    for (auto& entry : mStreams) fn(*entry.second);
+}
+
+CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
+    const VtspCommand& c = cmd.command();
+    uint32_t streamId = c.u.stmVideo.streamId;
+    std::lock_guard<std::mutex> lock(mMutex);
+
+    switch (c.code) {
+        case _VTSP_CMD_STREAM_VIDEO_START:
+        case _VTSP_CMD_STREAM_VIDEO_MODITY:
+        case _VTSP_CMD_STREAM_VIDEO_END:
+            break;
+        case _VTSP_CMD_CONFIG:
+            streamId = static_cast<uint32_t>(static_cast<int32_t>(c.u.config.data[1]));
+            LOGD("_VTSP_CMD_CONFIG, streamId %d", int(streamId));
+            if (mStreams.find(streamId) == mStreams.end()) {
+                LOGD("stream is not created, streamId %d", int(streamId));
+                return nullptr;
+            }
+            break;
+        default:
+            LOGD("code %d, not supported yet, ignore it", c.code);
+            return nullptr;
+    }
+
+    const auto it = mStreams.find(streamId);
+    if (it != mStreams.end()) {
+        LOGD("exsited stream, streamId %d", int(streamId));
+        CmdBuffer* reply = it->second->parse(cmd);
+        if (!it->second->isAlive()) {
+            LOGD("delelte the stream, streamId %d", int(streamId));
+            mStreams.erase(it);
+        }
+        return reply;
+    }
+
+    LOGD("%s: keep new stream, streamId %d", "parse", int(streamId));
+    auto stream = std::make_shared<StreamInfoMvd>(mCameraCodecParameter, mCameraConfig, mCaptureId);
+    CmdBuffer* reply = stream->parse(cmd);
+    if (stream->isAlive()) mStreams[streamId] = stream;
+    return reply;
+}
+
+void CmdCallbackMvd::setCaptureId(const char* id) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    if (id != nullptr) mCaptureId = id;
+    forEachStream([id](StreamInfoMvd& s) { s.setCaptureId(id); });
+}
+
+void CmdCallbackMvd::setRenderId(const char* id) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    forEachStream([id](StreamInfoMvd& s) { s.setRenderId(id); });
+}
+
+void CmdCallbackMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    mCameraConfig = config;
+    forEachStream([config](StreamInfoMvd& s) { s.setCodecParam(config); });
+}
+
+void CmdCallbackMvd::sendReplacedImage(bool start, const char* path) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    forEachStream([start, path](StreamInfoMvd& s) { s.sendReplacedImage(start, path); });
+}
+
+size_t CmdCallbackMvd::streamCount() {
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mStreams.size();
+}
+
+std::shared_ptr<StreamInfoMvd> CmdCallbackMvd::stream(uint32_t streamId) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    const auto it = mStreams.find(streamId);
+    return it == mStreams.end() ? nullptr : it->second;
+}
+
+CameraCodecParameter::CameraConfigEnum CmdCallbackMvd::cameraConfig() {
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mCameraConfig;
+}
+
+const char* CmdCallbackMvd::captureId() {
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mCaptureId;
+}
+
+}  // namespace android

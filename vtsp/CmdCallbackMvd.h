@@ -1,0 +1,53 @@
+// Routes the modem's commands to their streams by VTSP stream id and fans the
+// engine's camera, render, capture-size and still-image choices out to every
+// stream. One mutex serialises all of it, media engine calls included.
+#ifndef QUELLBORN_VTSP_CMDCALLBACKMVD_H
+#define QUELLBORN_VTSP_CMDCALLBACKMVD_H
+
+#include <cstdint>
+#include <map>
+#include <memory>
+#include <mutex>
+
+#include "CameraCodecParameter.h"
+#include "CmdCallback.h"
+#include "StreamInfoMvd.h"
+
+namespace android {
+
+class CmdCallbackMvd : public CmdCallback {
+public:
+    explicit CmdCallbackMvd(std::shared_ptr<CameraCodecParameter> table);
+    ~CmdCallbackMvd() override;
+    CmdCallbackMvd(const CmdCallbackMvd&) = delete;
+    CmdCallbackMvd& operator=(const CmdCallbackMvd&) = delete;
+
+    CmdBuffer* parse(const CmdBuffer& cmd) override;
+    // The dispatcher and its streams keep the pointers given to the two
+    // setters below: callers pass texts that live for the process (the
+    // camera and render name constants, or names the engine keeps).
+    void setCaptureId(const char* id) override;
+    void setRenderId(const char* id) override;
+    void setCodecParam(CameraCodecParameter::CameraConfigEnum config) override;
+    void sendReplacedImage(bool start, const char* path) override;
+
+    // Diagnostics for tools and tests.
+    size_t streamCount();
+    std::shared_ptr<StreamInfoMvd> stream(uint32_t streamId);
+    CameraCodecParameter::CameraConfigEnum cameraConfig();
+    const char* captureId();
+
+private:
+    template <typename Fn>
+    void forEachStream(Fn fn);
+
+    std::map<uint32_t, std::shared_ptr<StreamInfoMvd>> mStreams;
+    std::shared_ptr<CameraCodecParameter> mCameraCodecParameter;
+    CameraCodecParameter::CameraConfigEnum mCameraConfig;
+    const char* mCaptureId;
+    std::mutex mMutex;
+};
+
+}  // namespace android
+
+#endif  // QUELLBORN_VTSP_CMDCALLBACKMVD_H

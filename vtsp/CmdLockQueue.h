@@ -1,0 +1,121 @@
+// Blocking first-in, first-out queue joining the link's threads.
+//
+// Exactly one consumer waits on a queue; a push and a close each wake one
+// waiter. The owner pauses a queue with reset (pushes refused, consumer keeps
+// waiting) and shuts it with destroy (consumer woken, every wait returns false).
+#ifndef QUELLBORN_VTSP_CMDLOCKQUEUE_H
+#define QUELLBORN_VTSP_CMDLOCKQUEUE_H
+
+#include <android/log.h>
+#include <pthread.h>
+
+#include <deque>
+
+namespace android {
+
+template <typename T>
+class CmdLockQueue {
+public:
+    enum State { QUEUE_CLOSED = 0, QUEUE_RUNNING = 1, QUEUE_STOPPED = 2 };
+
+    CmdLockQueue() {
+        pthread_condattr_t attr;
+        pthread_condattr_init(&attr);
+        // Waits never time out today, but a monotonic clock keeps any future
+        // timed wait immune to wall-clock changes on the handset.
+        pthread_condattr_setclock(&attr, CLOCK_MONOTONIC);
+        pthread_cond_init(&mCond, &attr);
+        pthread_condattr_destroy(&attr);
+        pthread_mutex_init(&mMutex, nullptr);
+    }
+
+    ~CmdLockQueue() {
+        pthread_cond_destroy(&mCond);
+        pthread_mutex_destroy(&mMutex);
+    }
+
+    CmdLockQueue(const CmdLockQueue&) = delete;
+    CmdLockQueue& operator=(const CmdLockQueue&) = delete;
+
+    void start() {
+        Lock lock(mMutex);
+        mState = QUEUE_RUNNING;
+    }
+
+    void pushAndSignal(const T& elem) {
+        {
+            Lock lock(mMutex);
+            if (mState != QUEUE_RUNNING) {
+                __android_log_print(ANDROID_LOG_ERROR, "VTSPManager", "%s: failed to push elem",
+                                    "pushAndSignal");
+                return;
+            }
+            mQueue.push_back(elem);
+        }
+        pthread_cond_signal(&mCond);
+    }
+
+    // Takes the front element into `out`; false once the queue is closed.
+    bool waitAndPop(T& out) {
+        Lock lock(mMutex);
+        if (mState == QUEUE_CLOSED) return false;
+        while (mQueue.empty()) {
+            pthread_cond_wait(&mCond, &mMutex);
+            if (mState == QUEUE_CLOSED) return false;
+        }
+        out = mQueue.front();
+        mQueue.pop_front();
+        return true;
+    }
+
+    void reset() {
+        Lock lock(mMutex);
+        drain();
+        mState = QUEUE_STOPPED;
+    }
+
+    void destroy() {
+        {
+            Lock lock(mMutex);
+            drain();
+            mState = QUEUE_CLOSED;
+        }
+        pthread_cond_signal(&mCond);
+    }
+
+    // Snapshot for diagnostics and tests.
+    State state() {
+        Lock lock(mMutex);
+        return static_cast<State>(mState);
+    }
+    size_t size() {
+        Lock lock(mMutex);
+        return mQueue.size();
+    }
+
+private:
+    class Lock {
+    public:
+        explicit Lock(pthread_mutex_t& m) : mM(m) { pthread_mutex_lock(&mM); }
+        ~Lock() { pthread_mutex_unlock(&mM); }
+        Lock(const Lock&) = delete;
+        Lock& operator=(const Lock&) = delete;
+
+    private:
+        pthread_mutex_t& mM;
+    };
+
+    // Releases the elements one by one from the front, under the lock.
+    void drain() {
+        while (!mQueue.empty()) mQueue.pop_front();
+    }
+
+    std::deque<T> mQueue;
+    pthread_cond_t mCond;
+    pthread_mutex_t mMutex;
+    int mState = QUEUE_CLOSED;
+};
+
+}  // namespace android
+
+#endif  // QUELLBORN_VTSP_CMDLOCKQUEUE_H

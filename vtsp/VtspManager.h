@@ -1,0 +1,88 @@
+// The command link to the modem: three threads around the modem pipe.
+//
+//   tVtspCmdRx  reads whole 3664-byte records, routes them by target module
+//               and queues video commands on mRxQueue;
+//   tVtspCmdHd  converts each command to host order, logs it, hands it to the
+//               stream dispatcher and queues its reply on mTxQueue;
+//   tVtspCmdTx  writes each reply as a whole record.
+//
+// SIGUSR1 (installed without SA_RESTART) interrupts a thread blocked in the
+// device so that destroy() can end it.
+#ifndef QUELLBORN_VTSP_VTSPMANAGER_H
+#define QUELLBORN_VTSP_VTSPMANAGER_H
+
+#include <pthread.h>
+
+#include <atomic>
+#include <memory>
+
+#include "CameraCodecParameter.h"
+#include "CmdBuffer.h"
+#include "CmdCallbackMvd.h"
+#include "CmdLockQueue.h"
+
+namespace android {
+
+constexpr const char* kModemPipePath = "/dev/spipe_lte9";
+
+class VtspManager {
+public:
+    struct CameraResolution {
+        int32_t width;
+        int32_t height;
+        int32_t frameRate;
+    };
+
+    // The process's link, created on first use (the engine's constructor is
+    // the first caller, before any other user exists).
+    static VtspManager* getInstance();
+
+    // A link of its own on `devName`; tests and tools use this to run a link
+    // on a pseudo-terminal without touching the process singleton.
+    explicit VtspManager(const char* devName);
+    VtspManager(const VtspManager&) = delete;
+    VtspManager& operator=(const VtspManager&) = delete;
+
+    bool init();
+    void start();
+    void stop();
+    void destroy();
+    CmdBuffer* parse(std::shared_ptr<CmdBuffer> cmd);
+    bool getCameraResolution(CameraCodecParameter::CameraConfigEnum config, CameraResolution& out);
+
+    static void* cmdRxFunc(void* arg);
+    static void* cmdTxFunc(void* arg);
+    static void* cmdHandleFunc(void* arg);
+    static int readFromVpr(VtspManager* vm, unsigned char* buf, int len);
+    static int writeToVpr(VtspManager* vm, const unsigned char* buf, int len);
+
+    int mFd;
+    std::shared_ptr<CameraCodecParameter> mCameraCodecParameter;
+    std::shared_ptr<CmdCallbackMvd> mCmdCallback;
+    const char* mDevName;
+    std::atomic<bool> mRxRunning;
+    std::atomic<bool> mTxRunning;
+    pthread_t mRxThread;
+    pthread_t mTxThread;
+    pthread_t mHandleThread;
+    CmdLockQueue<std::shared_ptr<CmdBuffer>> mRxQueue;
+    CmdLockQueue<std::shared_ptr<CmdBuffer>> mTxQueue;
+
+private:
+    // Set by each thread as its last act, so destroy() knows when to stop
+    // re-sending SIGUSR1 to it.
+    std::atomic<bool> mRxEnded{false};
+    std::atomic<bool> mTxEnded{false};
+
+    void joinThread(pthread_t& thread, std::atomic<bool>* ended);
+
+    static VtspManager* sVm;
+};
+
+// SIGUSR1 handler: does nothing; its only purpose is to make a blocked read or
+// write fail with EINTR.
+void fakeHandler(int sig);
+
+}  // namespace android
+
+#endif  // QUELLBORN_VTSP_VTSPMANAGER_H
