@@ -238,17 +238,19 @@ void StreamInfoMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config)
     } else {
         mParamChanged = false;
     }
-    // On failure the streams stay suspended with mParamChanged set; the next
-    // start or modify of this stream resumes them, so nothing is resumed
-    // into a codec the engine refused.
     if (Mvd_SetCdc(mMvdStreamId, &codec) != 0) {
         LOGE("%s: SetCodec failed !!!", "setCodecParam");
-        return;
     }
-    if (mParamChanged) {
-        Mvd_ResumeAllStrm();
-        mParamChanged = false;
-    }
+    // Resumed even when the engine refused the codec: the streams then go on
+    // with the codec they had, where waiting for the next modify of this
+    // stream could leave every stream of the call frozen.
+    resumeIfParamChanged();
+}
+
+void StreamInfoMvd::resumeIfParamChanged() {
+    if (!mParamChanged) return;
+    Mvd_ResumeAllStrm();
+    mParamChanged = false;
 }
 
 void StreamInfoMvd::setCaptureId(const char* id) {

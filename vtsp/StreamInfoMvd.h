@@ -59,6 +59,9 @@ public:
 
     bool isAlive() const { return mStat != STREAM_ENDED; }
 
+    // Lifts a suspend of all engine streams that this stream caused.
+    void resumeIfParamChanged();
+
     static bool isActive(int32_t stat) {
         return stat == STREAM_SENDONLY || stat == STREAM_RECVONLY || stat == STREAM_SENDRECV;
     }

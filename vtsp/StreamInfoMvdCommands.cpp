@@ -20,6 +20,9 @@ CmdBuffer* StreamInfoMvd::parse(const CmdBuffer& cmd) {
         case _VTSP_CMD_CONFIG:
             LOGD("_VTSP_CMD_CONFIG");
             rtcpParamConfig(cmd, mStat);
+            // A feedback change mid-call suspends every engine stream; lift it
+            // now rather than at this stream's next modify, which may never come.
+            resumeIfParamChanged();
             return nullptr;
         case _VTSP_CMD_STREAM_VIDEO_START:
             LOGD("_VTSP_CMD_STREAM_VIDEO_START");
@@ -67,10 +70,7 @@ CmdBuffer* StreamInfoMvd::commandModifyHandler(const CmdBuffer& cmd) {
 
     // A suspend caused by this command's codec or RTCP step, or by a remote
     // port change, is lifted before the command ends.
-    if (mParamChanged) {
-        Mvd_ResumeAllStrm();
-        mParamChanged = false;
-    }
+    resumeIfParamChanged();
 
     if (isActive(mStat) && mProcStartCnt == 0) {
         const int started = Mvd_ProcStart(mMvdStreamId);

@@ -1,0 +1,634 @@
+// One video stream driven by modem commands and engine setters, observed
+// through the media engine calls it makes and the lines it logs.
+#include <android/log.h>
+#include <gmock/gmock.h>
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <memory>
+#include <string>
+#include <vector>
+
+#include "CmdBuffer.h"
+#include "HostFakes.h"
+#include "LogCapture.h"
+#include "StreamInfoMvd.h"
+#include "VtspRecord.h"
+
+using namespace android;
+using namespace vtspcodec;
+
+namespace {
+
+constexpr uint32_t kVtspId = 5;
+const std::string kOpen = "Mvd_Open(\"10.0.0.1\", 6000, out=1) = 0";
+const std::string kStartCodec = "{pt=96 br=600000 fps=30 480x640}";
+const std::string kAttachFront =
+        "Mvd_CaptureAttach(1, \"Camera 1, Facing front, Orientation 270\") = 0";
+using V = std::vector<std::string>;
+// What a modify that changes nothing asks of engine stream 1 after a start.
+const V kQuiet = {"Mvd_SetUniqueName(1, \"Remote\") = 0",
+                  "Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
+                  "Mvd_RedSetEnable(1, 0) = 0"};
+
+V then(V first, const V& rest) {
+    first.insert(first.end(), rest.begin(), rest.end());
+    return first;
+}
+
+CmdBuffer hostOrder(const VPR_Comm& record) {
+    CmdBuffer b(VPR_COMM_VTSP_CMD, record.body);
+    b.translate(true);
+    return b;
+}
+
+StreamCommand command(int32_t code, uint32_t dir, uint16_t remotePort = 5000,
+                      const char* remoteIp = "192.168.1.2") {
+    StreamCommand c;
+    c.code = code;
+    c.streamId = kVtspId;
+    c.dir = dir;
+    c.localAddr = address("10.0.0.1", 6000);
+    c.remoteAddr = remotePort != 0 ? address(remoteIp, remotePort) : noAddress();
+    return c;
+}
+
+StreamCommand start(uint32_t dir) { return command(_VTSP_CMD_STREAM_VIDEO_START, dir); }
+StreamCommand modify(uint32_t dir) { return command(_VTSP_CMD_STREAM_VIDEO_MODITY, dir); }
+
+ConfigCommand rtcpMask(int16_t on, int16_t mask) {
+    ConfigCommand c;
+    c.data[0] = on;
+    c.data[1] = static_cast<int16_t>(kVtspId);
+    c.data[2] = mask;
+    return c;
+}
+
+class StreamInfoMvdTest : public ::testing::Test {
+protected:
+    StreamInfoMvdTest() {
+        hostfakes::reset();
+        table->fill(CameraCodecParameter::CODEC_H264);
+        table->fill(CameraCodecParameter::CODEC_OTHER);
+        stream = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    }
+    ~StreamInfoMvdTest() override {
+        stream.reset();
+        hostfakes::reset();
+    }
+
+    std::unique_ptr<StreamInfoMvd> makeStream(CameraCodecParameter::CameraConfigEnum config) {
+        return std::make_unique<StreamInfoMvd>(table, config, kFrontCameraName);
+    }
+
+    // Runs one command and returns the engine calls it made; the reply is
+    // kept for the test to look at.
+    std::vector<std::string> run(const VPR_Comm& record, StreamInfoMvd* s = nullptr) {
+        const size_t mark = hostfakes::callCount();
+        reply.reset((s != nullptr ? s : stream.get())->parse(hostOrder(record)));
+        return hostfakes::callTextsSince(mark);
+    }
+    std::vector<std::string> run(const StreamCommand& c, StreamInfoMvd* s = nullptr) {
+        return run(streamRecord(c), s);
+    }
+
+    // Starts the stream sending and receiving with its codec applied.
+    void startRunning() {
+        run(start(VTSP_STREAM_DIR_SENDRECV));
+        ASSERT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
+        ASSERT_EQ(1, stream->mProcStartCnt);
+        log.clear();
+    }
+
+    // The stream's log lines, each prefixed with its priority letter.
+    std::vector<std::string> lines() const {
+        std::vector<std::string> out;
+        for (const LogLine& l : log.linesWithTag("CmdclbMVD")) {
+            const char* p = l.priority == ANDROID_LOG_ERROR  ? "E "
+                          : l.priority == ANDROID_LOG_INFO   ? "I "
+                          : l.priority == ANDROID_LOG_DEBUG  ? "D "
+                                                             : "? ";
+            out.push_back(p + l.text);
+        }
+        return out;
+    }
+
+    std::shared_ptr<CameraCodecParameter> table = std::make_shared<CameraCodecParameter>();
+    LogCapture log;
+    std::unique_ptr<StreamInfoMvd> stream;
+    std::unique_ptr<CmdBuffer> reply;
+};
+
+}  // namespace
+
+using ::testing::Contains;
+using ::testing::Not;
+
+TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
+    const V calls = run(start(VTSP_STREAM_DIR_SENDRECV));
+    EXPECT_EQ((V{kOpen,
+                 "Mvd_TptSetSend(1, 1) = 0",
+                 "Mvd_TptSetRecv(1, 1) = 0",
+                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
+                 "Mvd_SetUniqueName(1, \"Remote\") = 0",
+                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0",
+                 "Mvd_ArsSetEnable(1, 1) = 0",
+                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0",
+                 "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
+                 "Mvd_SetSendPayload(1, 96) = 0",
+                 "Mvd_RedSetEnable(1, 0) = 0",
+                 "Mvd_ProcStart(1) = 0",
+                 kAttachFront}),
+              calls);
+    // A stream command read through the configuration view names no RTCP
+    // template, so the initial mask stays and no feedback switch is touched.
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START",
+                 "D local 10.0.0.1\\6000[1]",
+                 "D <<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>",
+                 "D remote 192.168.1.2\\5000[1]",
+                 "D socketRemoteParamConfig: Mvd_SetRmtAddr, ip:192.168.1.2, port: 5000, streamId 1, ret 0",
+                 "D commandModifyHandler: Mvd_SetUniqueName(), streamId 1, renderid Remote, ret 0",
+                 "D codecParamConfig: codec set payload 96, bitrate 600000, fps 30, 480 x 640, mCameraConfig 2",
+                 "D rtcpParamConfig Recive RTCP mask, templCode: 5, data[0]: 4, data[2]: 0, mRTCPEnableMask: 208",
+                 "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
+                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
+                 "D rtcpParamConfig: return",
+                 "D commandModifyHandler: Mvd_ProcStart(1), ret 0, cnt 1",
+                 "D commandModifyHandler: Mvd_CaptureAttach(), streamId 1, ret 0"}),
+              lines());
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
+    EXPECT_EQ(kVtspId, stream->mStreamId);
+    EXPECT_EQ(1u, stream->mMvdStreamId);
+
+    // The reply is a bind request carrying the local end in host order.
+    ASSERT_NE(nullptr, reply);
+    EXPECT_EQ(VPR_COMM_NET, reply->type);
+    ASSERT_EQ(kVprNetBindSize, reply->length);
+    VprNetBind bind;
+    memcpy(&bind, reply->getCmd(), sizeof(bind));
+    EXPECT_EQ(7u, bind.code);
+    EXPECT_EQ(5, bind.streamId);
+    EXPECT_EQ(6000, bind.addr.port);
+    EXPECT_EQ(0u, bind.addr.type);
+    EXPECT_EQ("10.0.0.1", addressText(bind.addr));
+    for (uint8_t b : bind.reserved) ASSERT_EQ(0, b);
+    reply->translate(false);
+    EXPECT_EQ(0x17, reply->getCmd()[8 + 20]);  // 6000, big-endian for the modem
+    EXPECT_EQ(0x70, reply->getCmd()[8 + 21]);
+}
+
+TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
+    startRunning();
+    // Held: processing stops, nothing restarts it.
+    EXPECT_EQ(then({"Mvd_ProcStop(1) = 0"}, kQuiet), run(modify(_VTSP_STREAM_DIR_INACTIVE)));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
+    EXPECT_TRUE(stream->isAlive());
+    // The local end, once known, is neither re-read nor logged again.
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_MODITY",
+                 "D <<<<<<<<<<<<<<<_VTSP_STREAM_DIR_INACTIVE>>>>>>>>>>>>>>>",
+                 "D commandModifyHandler: Mvd_SetUniqueName(), streamId 1, renderid Remote, ret 0",
+                 "D rtcpParamConfig Recive RTCP mask, templCode: 5, data[0]: 1, data[2]: 0, mRTCPEnableMask: 208",
+                 "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
+                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
+                 "D rtcpParamConfig: return"}),
+              lines());
+
+    // Back to both directions: transport on, processing and camera restart.
+    EXPECT_EQ(then(then({"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0"}, kQuiet),
+                   {"Mvd_ProcStart(1) = 0", kAttachFront}),
+              run(modify(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ(1, stream->mProcStartCnt);
+
+    // The same direction again switches nothing and does not start twice.
+    EXPECT_EQ(kQuiet, run(modify(VTSP_STREAM_DIR_SENDRECV)));
+
+    EXPECT_EQ(then({"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 0) = 0"}, kQuiet),
+              run(modify(VTSP_STREAM_DIR_SENDONLY)));
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, stream->mStat);
+    EXPECT_EQ(then({"Mvd_TptSetSend(1, 0) = 0", "Mvd_TptSetRecv(1, 1) = 0"}, kQuiet),
+              run(modify(VTSP_STREAM_DIR_RECVONLY)));
+    EXPECT_EQ(StreamInfoMvd::STREAM_RECVONLY, stream->mStat);
+
+    // An unknown direction leaves the state; direction "ended" stops processing.
+    EXPECT_EQ(kQuiet, run(modify(7)));
+    EXPECT_EQ(StreamInfoMvd::STREAM_RECVONLY, stream->mStat);
+    EXPECT_EQ(then({"Mvd_ProcStop(1) = 0"}, kQuiet), run(modify(_VTSP_STREAM_DIR_ENDED)));
+    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
+    EXPECT_FALSE(stream->isAlive());
+    EXPECT_EQ(0, stream->mProcStartCnt);
+
+    const V logged = lines();
+    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDONLY>>>>>>>>>>>>>>>>>"));
+    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<<VTSP_STREAM_DIR_RECVONLY>>>>>>>>>>>>>>>>>>"));
+    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<_VTSP_STREAM_DIR_ENDED>>>>>>>>>>>>>>>>>"));
+}
+
+TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillReplies) {
+    StreamCommand noLocal = start(VTSP_STREAM_DIR_SENDRECV);
+    noLocal.localAddr = noAddress();
+    EXPECT_EQ(V{}, run(noLocal));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local \\0[0]"}), lines());
+
+    log.clear();
+    StreamCommand portZero = modify(VTSP_STREAM_DIR_SENDRECV);
+    portZero.localAddr = address("10.0.0.1", 0);
+    EXPECT_EQ(V{}, run(portZero));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_MODITY", "D local 10.0.0.1\\0[1]"}), lines());
+    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
+
+    // The bind request still goes out so the modem learns the local end.
+    log.clear();
+    hostfakes::setResult("Mvd_Open", -1);
+    EXPECT_EQ((V{"Mvd_Open(\"10.0.0.1\", 6000, out=0) = -1"}),
+              run(start(VTSP_STREAM_DIR_SENDRECV)));
+    ASSERT_NE(nullptr, reply);
+    EXPECT_EQ(VPR_COMM_NET, reply->type);
+    EXPECT_EQ(7u, reinterpret_cast<const VprNetBind*>(reply->getCmd())->code);
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local 10.0.0.1\\6000[1]",
+                 "E commandModifyHandler: Failed to Mvd_open, ip:10.0.0.1, port: 6000"}),
+              lines());
+    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
+    EXPECT_EQ(0u, stream->mMvdStreamId);
+
+    // Codes that are not stream commands are ignored silently.
+    log.clear();
+    EXPECT_EQ(V{}, run(commandRecord(20)));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ(V{}, lines());
+}
+
+TEST_F(StreamInfoMvdTest, StartWithoutRemoteOpensButProcessesOnlyOnceTheRemoteIsKnown) {
+    EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0"}),
+              run(command(_VTSP_CMD_STREAM_VIDEO_START, VTSP_STREAM_DIR_SENDRECV, 0)));
+    ASSERT_NE(nullptr, reply);
+    EXPECT_THAT(lines(), Contains("D remote \\0[0]"));
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
+    EXPECT_EQ(0, stream->mProcStartCnt);
+
+    // The stream was already active, so the first codec set suspends the
+    // engine's streams and the same command resumes them.
+    EXPECT_EQ((V{"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
+                 "Mvd_SetUniqueName(1, \"Remote\") = 0",
+                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0",
+                 "Mvd_SuspendAllStrm() = 0",
+                 "Mvd_ArsSetEnable(1, 1) = 0",
+                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0",
+                 "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
+                 "Mvd_SetSendPayload(1, 96) = 0",
+                 "Mvd_RedSetEnable(1, 0) = 0",
+                 "Mvd_ResumeAllStrm() = 0",
+                 "Mvd_ProcStart(1) = 0",
+                 kAttachFront}),
+              run(modify(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_THAT(lines(), Contains("D codecParamConfig Mvd_SuspendAllStrm, codec params changed "));
+}
+
+TEST_F(StreamInfoMvdTest, OnlyANewRemotePortReachesTheEngine) {
+    startRunning();
+    EXPECT_EQ(kQuiet, run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5000,
+                                  "192.168.1.99")));
+
+    // The address stays the first one learnt; the port change is resumed
+    // by the same command.
+    EXPECT_EQ(then(then({"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5002) = 0"}, kQuiet),
+                   {"Mvd_ResumeAllStrm() = 0"}),
+              run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5002,
+                          "192.168.1.99")));
+    EXPECT_THAT(lines(),
+                Contains("D socketRemoteParamConfig: Port changed, Mvd_SetRmtAddr,port: 5002, ret 0"));
+    EXPECT_FALSE(stream->mParamChanged);
+
+    // IPv6 ends, in either type value, are passed as eight full groups.
+    auto v6 = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
+    c.localAddr = address("fe80::1", 6000);
+    c.localAddr.type = kAddrTypeIpv6Alt;
+    c.remoteAddr = address("2001:db8::2", 5000);
+    const V calls = run(c, v6.get());
+    ASSERT_GE(calls.size(), 4u);
+    EXPECT_EQ("Mvd_Open(\"fe80:0:0:0:0:0:0:1\", 6000, out=2) = 0", calls[0]);
+    EXPECT_EQ("Mvd_SetRmtAddr(2, \"2001:db8:0:0:0:0:0:2\", 5000) = 0", calls[3]);
+    EXPECT_THAT(lines(), Contains("D local fe80:0:0:0:0:0:0:1\\6000[2]"));
+    EXPECT_THAT(lines(), Contains("D remote 2001:db8:0:0:0:0:0:2\\5000[2]"));
+}
+
+TEST_F(StreamInfoMvdTest, RateControlFollowsTheBandwidthCapAndTheFrameRate) {
+    struct Case {
+        uint32_t kbps;
+        int upper;
+    };
+    // 4194304 kbit/s overflows to 0 and so means no cap, like 0 itself.
+    const Case cases[] = {{500, 512000},     {0, 960000},       {2000, 960000}, {937, 959488},
+                          {938, 960000},     {4194304, 960000}, {4194305, 1024}};
+    unsigned id = 0;
+    for (const Case& k : cases) {
+        ++id;
+        auto s = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+        StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
+        c.localVideoAsBwKbps = k.kbps;
+        EXPECT_THAT(run(c, s.get()),
+                    Contains("Mvd_ArsSetParm(" + std::to_string(id) + ", 100000, " +
+                             std::to_string(k.upper) + ", 20, 30) = 0"))
+                << k.kbps;
+    }
+
+    log.clear();
+    auto slow = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_15FPS);
+    StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
+    c.encodeType[0] = 100;
+    const V calls = run(c, slow.get());
+    EXPECT_THAT(calls, Contains("Mvd_ArsSetParm(8, 100000, 660000, 10, 15) = 0"));
+    EXPECT_THAT(calls, Contains("Mvd_SetCdc(8, {pt=100 br=400000 fps=15 480x640}) = 0"));
+    EXPECT_THAT(calls, Contains("Mvd_SetSendPayload(8, 100) = 0"));
+    EXPECT_THAT(lines(), Contains("D codecParamConfig: codec set payload 100, bitrate 400000, "
+                                  "fps 15, 480 x 640, mCameraConfig 1"));
+}
+
+TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
+    // An encoder other than 0 is refused before the codec is read.
+    StreamCommand other = start(VTSP_STREAM_DIR_SENDRECV);
+    other.encoder = 1;
+    EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0",
+                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
+                 "Mvd_SetUniqueName(1, \"Remote\") = 0"}),
+              run(other));
+    EXPECT_NE(nullptr, reply);
+    EXPECT_THAT(lines(), Contains("D codec type 1 is not supported "));
+    EXPECT_EQ(0, stream->mProcStartCnt);
+
+    // A codec that cannot be read is left alone and the stream still runs.
+    hostfakes::setResult("Mvd_GetCdc", -1);
+    log.clear();
+    auto unread = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    EXPECT_EQ((V{"Mvd_Open(\"10.0.0.1\", 6000, out=2) = 0", "Mvd_TptSetSend(2, 1) = 0",
+                 "Mvd_TptSetRecv(2, 1) = 0", "Mvd_SetRmtAddr(2, \"192.168.1.2\", 5000) = 0",
+                 "Mvd_SetUniqueName(2, \"Remote\") = 0",
+                 "Mvd_GetCdc(2, \"H264\", out=-) = -1",
+                 "Mvd_RedSetEnable(2, 0) = 0", "Mvd_ProcStart(2) = 0",
+                 "Mvd_CaptureAttach(2, \"Camera 1, Facing front, Orientation 270\") = 0"}),
+              run(start(VTSP_STREAM_DIR_SENDRECV), unread.get()));
+    EXPECT_THAT(lines(), Contains("E checkIfCodecParamUpdated: GetCodec failed !!!"));
+    hostfakes::clearResult("Mvd_GetCdc");
+
+    // A codec the engine refuses stops the command before processing.
+    hostfakes::setResult("Mvd_SetCdc", -1);
+    log.clear();
+    auto refused = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    const V calls = run(start(VTSP_STREAM_DIR_SENDRECV), refused.get());
+    ASSERT_FALSE(calls.empty());
+    EXPECT_EQ("Mvd_SetCdc(3, " + kStartCodec + ") = -1", calls.back());
+    EXPECT_THAT(calls, Contains("Mvd_ArsSetParm(3, 100000, 960000, 20, 30) = 0"));
+    EXPECT_NE(nullptr, reply);
+    EXPECT_EQ("E codecParamConfig: SetCodec failed !!!", lines().back());
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, refused->mStat);
+    EXPECT_EQ(0, refused->mProcStartCnt);
+}
+
+TEST_F(StreamInfoMvdTest, OnlyTheVideoOrientationUriSetsTheExtension) {
+    StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
+    c.extension = 1;
+    c.extmapId = 3;
+    c.extmapUri = "urn:3gpp:video-orientation";
+    const V calls = run(c);
+    ASSERT_GE(calls.size(), 4u);
+    EXPECT_EQ("Mvd_RtpSetExt(1, 2, 3) = 0", calls[calls.size() - 4]);
+    EXPECT_EQ("Mvd_RedSetEnable(1, 0) = 0", calls[calls.size() - 3]);
+    EXPECT_THAT(lines(), Contains("D rtcpParamConfigMvd_RtpSetExt, extension: 1, "
+                                  "uri: urn:3gpp:video-orientation, id: 3"));
+
+    c.code = _VTSP_CMD_STREAM_VIDEO_MODITY;
+    c.extmapId = 0x103;  // only the low byte is the id
+    EXPECT_THAT(run(c), Contains("Mvd_RtpSetExt(1, 2, 3) = 0"));
+
+    for (const char* uri : {"urn:3gpp:video-orientation:7", "urn:3gpp:video-orientatio", ""}) {
+        c.extmapUri = uri;
+        EXPECT_THAT(run(c), Not(Contains(::testing::StartsWith("Mvd_RtpSetExt")))) << uri;
+    }
+
+    // A URI filling its whole field is read as exactly those 128 characters;
+    // the bytes behind it ("abcd" in confMask) are not part of it.
+    log.clear();
+    c.extmapUri = "urn:3gpp:video-orientation" + std::string(102, 'x');
+    c.confMask = 0x64636261;
+    EXPECT_THAT(run(c), Not(Contains(::testing::StartsWith("Mvd_RtpSetExt"))));
+    EXPECT_THAT(lines(), Contains("D rtcpParamConfigMvd_RtpSetExt, extension: 1, uri: " +
+                                  c.extmapUri + ", id: 259"));
+}
+
+TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
+    startRunning();
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_SuspendAllStrm() = 0",
+                 "Mvd_TptEnableTmmbr(1, 0) = 0", "Mvd_TptEnableNack(1, 1) = 0",
+                 "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
+              run(configRecord(rtcpMask(1, 0x30))));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ((V{"D _VTSP_CMD_CONFIG",
+                 "D Recive RTCP mask 48",
+                 "D rtcpParamConfig Recive RTCP mask, templCode: 23, data[0]: 1, data[2]: 48, mRTCPEnableMask: 16",
+                 "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
+                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
+                 "D rtcpParamConfig Mvd_SuspendAllStrm, rtcp params changed ",
+                 "D rtcpParamConfig: Mvd_TptEnableTmmbr(), ret 0",
+                 "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
+                 "D rtcpParamConfig: Mvd_TptEnableFir(), ret 0"}),
+              lines());
+    EXPECT_EQ(0x10, stream->mRTCPEnableMask);
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
+    EXPECT_FALSE(stream->mParamChanged);
+
+    // The same mask again changes nothing; a disabled template is ignored.
+    log.clear();
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(1, 0x30))));
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(2, 0x80))));
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(-1, 0x80))));
+    EXPECT_THAT(lines(), Contains("D rtcpParamConfig Recive RTCP mask, templCode: 23, "
+                                  "data[0]: -1, data[2]: 128, mRTCPEnableMask: 16"));
+    EXPECT_EQ(3u, log.count(ANDROID_LOG_DEBUG, "CmdclbMVD", "rtcpParamConfig: return"));
+    EXPECT_EQ(0x10, stream->mRTCPEnableMask);
+
+    // The suspend was lifted by the configuration itself: the next modify
+    // has nothing to resume.
+    EXPECT_EQ(kQuiet, run(modify(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_FALSE(stream->mParamChanged);
+
+    // A held stream switches feedback without suspending anything; a
+    // negative mask is sign-extended before the kept bits are taken.
+    run(modify(_VTSP_STREAM_DIR_INACTIVE));
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_TptEnableTmmbr(1, 1) = 0",
+                 "Mvd_TptEnableNack(1, 1) = 0", "Mvd_TptEnableFir(1, 1) = 0"}),
+              run(configRecord(rtcpMask(1, -1))));
+    EXPECT_EQ(0xD0, stream->mRTCPEnableMask);
+    EXPECT_FALSE(stream->mParamChanged);
+    EXPECT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
+}
+
+TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive) {
+    startRunning();
+    // Words the stream does not own come back to the engine unchanged.
+    tagMVD_CODEC seeded{};
+    ASSERT_TRUE(hostfakes::getMvdCodec(1, &seeded));
+    for (int i : {1, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19}) {
+        seeded.aiWord[i] = 7000 + i;
+    }
+    hostfakes::setMvdCodec(1, seeded);
+
+    size_t mark = hostfakes::callCount();
+    stream->setCodecParam(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS);
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0", "Mvd_SuspendAllStrm() = 0",
+                 "Mvd_SetCdc(1, {pt=96 br=256000 fps=15 240x320}) = 0", "Mvd_ResumeAllStrm() = 0"}),
+              hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"D setCodecParam Mvd_SuspendAllStrm, codec params changed "}), lines());
+    tagMVD_CODEC stored{};
+    ASSERT_TRUE(hostfakes::getMvdCodec(1, &stored));
+    const int expected[20] = {96,   7001, 256000, 15,   240,  320,  7006, 7007, 7008, 7009,
+                              7010, 7011, 7012,   7013, 7014, 7015, 7016, 7017, 7018, 7019};
+    for (int i = 0; i < 20; ++i) EXPECT_EQ(expected[i], stored.aiWord[i]) << i;
+
+    // The same configuration again only reads the codec.
+    mark = hostfakes::callCount();
+    stream->setCodecParam(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS);
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", {pt=96 br=256000 fps=15 240x320}) = 0"}),
+              hostfakes::callTextsSince(mark));
+
+    // A refused codec does not leave the engine suspended: the streams go on
+    // with the codec they had, and the next modify applies the new one.
+    log.clear();
+    hostfakes::setResult("Mvd_SetCdc", -1);
+    mark = hostfakes::callCount();
+    stream->setCodecParam(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", {pt=96 br=256000 fps=15 240x320}) = 0",
+                 "Mvd_SuspendAllStrm() = 0", "Mvd_SetCdc(1, " + kStartCodec + ") = -1",
+                 "Mvd_ResumeAllStrm() = 0"}),
+              hostfakes::callTextsSince(mark));
+    EXPECT_THAT(lines(), Contains("E setCodecParam: SetCodec failed !!!"));
+    EXPECT_FALSE(stream->mParamChanged);
+    hostfakes::clearResult("Mvd_SetCdc");
+    const V calls = run(modify(VTSP_STREAM_DIR_SENDRECV));
+    ASSERT_FALSE(calls.empty());
+    EXPECT_THAT(calls, Contains("Mvd_SetCdc(1, " + kStartCodec + ") = 0"));
+    EXPECT_EQ("Mvd_ResumeAllStrm() = 0", calls.back());
+
+    // A held stream takes the codec without suspending or resuming the
+    // engine, and drops a pending resume (here from a remote port change
+    // whose modify stopped at a refused encoder).
+    StreamCommand hold = command(_VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_STREAM_DIR_INACTIVE, 5004);
+    hold.encoder = 1;
+    run(hold);
+    ASSERT_TRUE(stream->mParamChanged);
+    ASSERT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
+    mark = hostfakes::callCount();
+    stream->setCodecParam(CameraCodecParameter::CAMERA_CIF_30FPS);
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
+                 "Mvd_SetCdc(1, {pt=96 br=400000 fps=30 352x288}) = 0"}),
+              hostfakes::callTextsSince(mark));
+    EXPECT_FALSE(stream->mParamChanged);
+}
+
+TEST_F(StreamInfoMvdTest, CaptureAndRenderNamesReachTheEngineOnlyWhenTheyMatter) {
+    const std::string frontCopy = kFrontCameraName;  // same text, other pointer
+    const std::string view = "RemoteView";
+    const std::string remoteCopy = kRemoteRenderName;
+    stream->setCaptureId(nullptr);
+    stream->setCaptureId(frontCopy.c_str());
+    stream->setRenderId(nullptr);
+    stream->setRenderId(remoteCopy.c_str());
+    // Not open yet: the new name is taken and logged, nothing is attached.
+    stream->setCaptureId(kBackCameraName);
+    EXPECT_EQ(0u, hostfakes::callCount());
+    EXPECT_EQ((V{"D setCaptureId: setCaptureId(), [Camera 1, Facing front, Orientation 270] -> "
+                 "[Camera 0, Facing back, Orientation 90]"}),
+              lines());
+
+    // Send-only: the render name waits for the next modify.
+    run(start(VTSP_STREAM_DIR_SENDONLY));
+    EXPECT_THAT(hostfakes::callTexts(),
+                Contains("Mvd_CaptureAttach(1, \"Camera 0, Facing back, Orientation 90\") = 0"));
+    log.clear();
+    size_t mark = hostfakes::callCount();
+    stream->setRenderId(view.c_str());
+    EXPECT_EQ(V{}, hostfakes::callTextsSince(mark));
+    EXPECT_EQ(V{}, lines());
+    EXPECT_THAT(run(modify(VTSP_STREAM_DIR_SENDONLY)),
+                Contains("Mvd_SetUniqueName(1, \"RemoteView\") = 0"));
+
+    // Receiving: the render name and the camera go to the engine at once.
+    run(modify(VTSP_STREAM_DIR_RECVONLY));
+    mark = hostfakes::callCount();
+    stream->setRenderId("Remote");
+    stream->setCaptureId(kFrontCameraName);
+    EXPECT_EQ((V{"Mvd_SetUniqueName(1, \"Remote\") = 0",
+                 kAttachFront}),
+              hostfakes::callTextsSince(mark));
+
+    // Held: names are stored but nothing is attached or renamed.
+    run(modify(_VTSP_STREAM_DIR_INACTIVE));
+    mark = hostfakes::callCount();
+    stream->setCaptureId(kBackCameraName);
+    stream->setRenderId(view.c_str());
+    EXPECT_EQ(V{}, hostfakes::callTextsSince(mark));
+    EXPECT_STREQ(kBackCameraName, stream->mCaptureId);
+    EXPECT_STREQ("RemoteView", stream->mRenderId);
+}
+
+TEST_F(StreamInfoMvdTest, ReplacedImageNeedsAnEngineStream) {
+    stream->sendReplacedImage(true, "/x.jpg");
+    EXPECT_EQ(0u, hostfakes::callCount());
+    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg",
+                 "D sendReplacedImage no valid stream"}),
+              lines());
+
+    startRunning();
+    size_t mark = hostfakes::callCount();
+    stream->sendReplacedImage(true, "/x.jpg");
+    stream->sendReplacedImage(false, "/x.jpg");
+    EXPECT_EQ((V{"Mvd_FileStartSendImage(1, \"/x.jpg\") = 0", "Mvd_FileStopSendImage(1) = 0"}),
+              hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg",
+                 "I sendReplacedImage, stop, path = /x.jpg"}),
+              lines());
+}
+
+TEST_F(StreamInfoMvdTest, EndStopsWhatRunsAndDestructionClosesTheEngineStream) {
+    // Destroyed while running: the engine stream is closed.
+    startRunning();
+    size_t mark = hostfakes::callCount();
+    stream.reset();
+    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(1), stat 3"}), lines());
+
+    // Never opened: nothing to stop or close.
+    log.clear();
+    auto fresh = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    mark = hostfakes::callCount();
+    EXPECT_EQ(V{}, run(command(_VTSP_CMD_STREAM_VIDEO_END, VTSP_STREAM_DIR_SENDRECV), fresh.get()));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_FALSE(fresh->isAlive());
+    fresh.reset();
+    EXPECT_EQ(mark, hostfakes::callCount());
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_END"}), lines());
+
+    // Running: the camera is detached and processing stops; closing is left
+    // to destruction.
+    auto running = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    run(start(VTSP_STREAM_DIR_SENDRECV), running.get());
+    EXPECT_EQ((V{"Mvd_CaptureDetach(2) = 0", "Mvd_ProcStop(2) = 0"}),
+              run(command(_VTSP_CMD_STREAM_VIDEO_END, VTSP_STREAM_DIR_SENDRECV), running.get()));
+    EXPECT_EQ(nullptr, reply);
+    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, running->mStat);
+    EXPECT_EQ((std::vector<unsigned>{2}), hostfakes::openMvdStreams());
+    log.clear();
+    running.reset();
+    EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(2), stat 0"}), lines());
+    EXPECT_EQ(std::vector<unsigned>{}, hostfakes::openMvdStreams());
+
+    // Held: processing has already stopped, only the camera is detached.
+    auto held = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    run(start(_VTSP_STREAM_DIR_INACTIVE), held.get());
+    EXPECT_EQ((V{"Mvd_CaptureDetach(3) = 0"}),
+              run(command(_VTSP_CMD_STREAM_VIDEO_END, _VTSP_STREAM_DIR_INACTIVE), held.get()));
+}
