@@ -76,6 +76,9 @@ bool VtspManager::init() {
     mTxRunning = true;
     mRxQueue.start();
     mTxQueue.start();
+    // destroy() may signal a device thread before it has installed the
+    // handler itself, and SIGUSR1's default action ends the process.
+    installSigusr1Handler();
     if (mRxThread == 0) {
         mRxEnded = false;
         if (pthread_create(&mRxThread, nullptr, cmdRxFunc, this) != 0) mRxThread = 0;

@@ -7,6 +7,8 @@
 #include <unistd.h>
 
 #include <chrono>
+#include <cstdio>
+#include <cstdlib>
 #include <fstream>
 #include <future>
 #include <memory>
@@ -60,9 +62,15 @@ public:
         });
         mTid = tidReady.get();
     }
-    // A test that failed half-way must not hang on a consumer still waiting.
+    // A test that failed half-way must not hang on a consumer still waiting;
+    // one that even a close cannot release ends the run at once.
     ~Consumer() {
-        if (mResult.valid() && !returnedWithin(0ms)) mQueue.destroy();
+        if (!mResult.valid() || returnedWithin(0ms)) return;
+        mQueue.destroy();
+        if (!returnedWithin(2s)) {
+            fprintf(stderr, "consumer still blocked in waitAndPop after destroy\n");
+            std::abort();
+        }
     }
     Consumer(const Consumer&) = delete;
     Consumer& operator=(const Consumer&) = delete;

@@ -4,6 +4,7 @@
 #include <android/log.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <signal.h>
 #include <sys/types.h>
 #include <unistd.h>
 
@@ -69,6 +70,18 @@ size_t tasksNamed(const std::string& name, bool sleepingOnly = false) {
 
 const char* const kThreadNames[] = {"tVtspCmdRx", "tVtspCmdHd", "tVtspCmdTx"};
 
+// True when each of the link's three threads exists exactly `count` times.
+bool linkThreads(size_t count, bool sleepingOnly = false) {
+    for (const char* name : kThreadNames) {
+        if (tasksNamed(name, sleepingOnly) != count) return false;
+    }
+    return true;
+}
+
+long long msSince(Clock::time_point t) {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - t).count();
+}
+
 template <typename Pred>
 bool eventually(Pred pred, std::chrono::milliseconds timeout = 5s) {
     const auto deadline = Clock::now() + timeout;
@@ -112,15 +125,19 @@ public:
     ~ScopedLink() { destroy(); }
     ScopedLink(const ScopedLink&) = delete;
     ScopedLink& operator=(const ScopedLink&) = delete;
+    bool init() {
+        mRunning = true;
+        return link.init();
+    }
     void destroy() {
-        if (mDestroyed) return;
-        mDestroyed = true;
+        if (!mRunning) return;
+        mRunning = false;
         link.destroy();
     }
     VtspManager link;
 
 private:
-    bool mDestroyed = false;
+    bool mRunning = false;
 };
 
 class VtspManagerTest : public ::testing::Test {
@@ -132,7 +149,7 @@ protected:
     void destroyLink() { mOwned.destroy(); }
 
     void startLink() {
-        ASSERT_TRUE(link.init());
+        ASSERT_TRUE(mOwned.init());
         ASSERT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, kRxEntry));
         ASSERT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, kTxEntry));
         ASSERT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, kHdEntry));
@@ -256,8 +273,8 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     EXPECT_EQ(started, hostfakes::callTexts());
     const std::string unchangedCodec = "Mvd_GetCdc(1, \"H264\", {pt=96 br=600000 fps=30 480x640}) = 0";
 
-    // RTCP feedback: NACK only (0x30 keeps just 0x10); the running streams
-    // are suspended until the next stream command.
+    // RTCP feedback: NACK only (0x30 keeps just 0x10). The running streams
+    // are suspended for the change and resumed before the command ends.
     ConfigCommand config;
     config.data[0] = 1;
     config.data[1] = 7;
@@ -266,8 +283,8 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     pty.writeRecord(configRecord(config));
     EXPECT_EQ((std::vector<std::string>{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_SuspendAllStrm() = 0",
                                         "Mvd_TptEnableTmmbr(1, 0) = 0", "Mvd_TptEnableNack(1, 1) = 0",
-                                        "Mvd_TptEnableFir(1, 0) = 0"}),
-              callsSince(mark, 5));
+                                        "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
+              callsSince(mark, 6));
 
     StreamCommand modify = start;
     modify.code = _VTSP_CMD_STREAM_VIDEO_MODITY;
@@ -275,9 +292,8 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     mark = hostfakes::callCount();
     pty.writeRecord(streamRecord(modify));
     EXPECT_EQ((std::vector<std::string>{"Mvd_ProcStop(1) = 0", "Mvd_SetUniqueName(1, \"Remote\") = 0",
-                                        unchangedCodec, "Mvd_RedSetEnable(1, 0) = 0",
-                                        "Mvd_ResumeAllStrm() = 0"}),
-              callsSince(mark, 5));
+                                        unchangedCodec, "Mvd_RedSetEnable(1, 0) = 0"}),
+              callsSince(mark, 4));
 
     modify.dir = VTSP_STREAM_DIR_SENDRECV;
     mark = hostfakes::callCount();
@@ -337,27 +353,44 @@ TEST_F(VtspManagerTest, StoppedLinkDropsCommandsUntilStartedAgain) {
 TEST_F(VtspManagerTest, DestroyEndsThreadsBlockedInTheDeviceAndOnEmptyQueues) {
     startLink();
     // Named threads, each sleeping: the receiver in read, the others in their queues.
-    ASSERT_TRUE(eventually([] {
-        for (const char* name : kThreadNames) {
-            if (tasksNamed(name, true) != 1) return false;
-        }
-        return true;
-    }));
+    ASSERT_TRUE(eventually([] { return linkThreads(1, true); }));
     ASSERT_EQ(2u, openDescriptorsOn(pty.devicePath()));  // ours and the link's
 
     const auto before = Clock::now();
     destroyLink();
-    EXPECT_LT(Clock::now() - before, 1s);
+    EXPECT_LT(msSince(before), 1000);
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, kRxStopped));
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, kTxStopped));
     EXPECT_EQ(-1, link.mFd);
     EXPECT_EQ(1u, openDescriptorsOn(pty.devicePath()));
-    EXPECT_TRUE(eventually([] {
-        for (const char* name : kThreadNames) {
-            if (tasksNamed(name) != 0) return false;
-        }
-        return true;
-    }));
+    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
+
+    // The link can be brought up again: device reopened, a fresh set of threads.
+    log.clear();
+    startLink();
+    EXPECT_NE(-1, link.mFd);
+    pty.writeRecord(streamRecord(startCommand(7)));
+    EXPECT_EQ(7, readBind().streamId);
+    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)));
+    EXPECT_TRUE(linkThreads(1));
+}
+
+TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
+    // The wake-up signal's default action ends the process, so destroy must
+    // not be able to send it before the link has set up its handler. Earlier
+    // links in this process may have installed one already: start from the default.
+    struct sigaction saved {};
+    sigaction(SIGUSR1, nullptr, &saved);
+    struct Restore {
+        const struct sigaction& s;
+        ~Restore() { sigaction(SIGUSR1, &s, nullptr); }
+    } restore{saved};
+    for (int i = 0; i < 20; ++i) {
+        signal(SIGUSR1, SIG_DFL);
+        ASSERT_TRUE(mOwned.init());
+        destroyLink();
+        ASSERT_EQ(-1, link.mFd);
+    }
 }
 
 TEST_F(VtspManagerTest, DestroyWithoutThreadsOnlyClosesAnOpenDevice) {
@@ -365,12 +398,16 @@ TEST_F(VtspManagerTest, DestroyWithoutThreadsOnlyClosesAnOpenDevice) {
     ASSERT_GE(fd, 0);
     link.mFd = fd;
     const auto before = Clock::now();
-    destroyLink();
-    EXPECT_LT(Clock::now() - before, 500ms);
+    link.destroy();
+    EXPECT_LT(msSince(before), 500);
     EXPECT_EQ(-1, link.mFd);
     EXPECT_EQ(-1, fcntl(fd, F_GETFD));
     EXPECT_EQ(EBADF, errno);
-    EXPECT_TRUE(log.linesWithTag(kTag).empty());
+
+    VtspManager closed(pty.devicePath());
+    closed.destroy();
+    EXPECT_EQ(-1, closed.mFd);
+    EXPECT_TRUE(log.linesWithTag(kTag).empty());  // no thread ran, none was woken
 }
 
 TEST_F(VtspManagerTest, SecondInitNeitherReopensNorStartsMoreThreads) {
@@ -386,32 +423,53 @@ TEST_F(VtspManagerTest, SecondInitNeitherReopensNorStartsMoreThreads) {
     // A round trip gives any extra thread time to announce itself.
     pty.writeRecord(streamRecord(startCommand(7)));
     EXPECT_EQ(7, readBind().streamId);
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, kRxEntry));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, kTxEntry));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, kHdEntry));
-    for (const char* name : kThreadNames) EXPECT_EQ(1u, tasksNamed(name)) << name;
+    for (const char* entry : {kRxEntry, kTxEntry, kHdEntry}) {
+        EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, entry)) << entry;
+    }
+    EXPECT_TRUE(linkThreads(1));
 }
 
 TEST_F(VtspManagerTest, UnopenableDeviceIsRetriedEveryTwoSeconds) {
     ScopedLink broken("/nonexistent/quellborn-modem");
-    EXPECT_TRUE(broken.link.init());
+    EXPECT_TRUE(broken.init());
     EXPECT_EQ(-1, broken.link.mFd);
     const std::string failed = std::string(kReadFailed) + "Bad file descriptor";
     ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 1, 2s));
     const auto first = Clock::now();
     ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 3s));
-    EXPECT_GT(Clock::now() - first, 1500ms);  // a pause, not a busy loop
+    EXPECT_GT(msSince(first), 1500);  // a pause, not a busy loop
     EXPECT_EQ(2u, log.count(ANDROID_LOG_ERROR, kTag, failed));
     // Destroy interrupts the pause instead of waiting it out.
     const auto before = Clock::now();
     broken.destroy();
-    EXPECT_LT(Clock::now() - before, 1s);
+    EXPECT_LT(msSince(before), 1000);
     EXPECT_EQ(2u, log.count(ANDROID_LOG_ERROR, kTag, failed));
+}
+
+TEST_F(VtspManagerTest, EndOfFileIsAFailedReadNotASpin) {
+    char path[] = "/tmp/quellborn-modem-XXXXXX";
+    const int fd = mkstemp(path);
+    ASSERT_GE(fd, 0);
+    close(fd);
+    struct Unlink {
+        const char* p;
+        ~Unlink() { unlink(p); }
+    } unlinkLater{path};
+
+    ScopedLink empty(path);
+    EXPECT_TRUE(empty.init());
+    const std::string eof = std::string(kReadFailed) + "end of file";
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, eof));
+    const auto before = Clock::now();
+    empty.destroy();
+    EXPECT_LT(msSince(before), 1000);
+    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, kTag, eof));
 }
 
 TEST_F(VtspManagerTest, ClosedModemEndIsLoggedAndDoesNotHoldUpDestroy) {
     startLink();
     pty.closeMaster();
+    // The kernel reports the hang-up as an error or as end of file.
     ASSERT_TRUE(eventually([&] {
         for (const LogLine& l : log.linesWithTag(kTag)) {
             if (l.priority == ANDROID_LOG_ERROR && l.text.rfind(kReadFailed, 0) == 0) return true;
@@ -420,9 +478,9 @@ TEST_F(VtspManagerTest, ClosedModemEndIsLoggedAndDoesNotHoldUpDestroy) {
     }));
     const auto before = Clock::now();
     destroyLink();
-    EXPECT_LT(Clock::now() - before, 1s);
+    EXPECT_LT(msSince(before), 1000);
     EXPECT_EQ(-1, link.mFd);
-    EXPECT_TRUE(eventually([] { return tasksNamed("tVtspCmdRx") == 0; }));
+    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
 
 TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
@@ -439,7 +497,11 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
                                  _VTSP_CMD_CONFIG, _VTSP_CMD_STREAM_VIDEO_END};
         VtspCommand* body = reinterpret_cast<VtspCommand*>(record.body);
         if (i % 5 != 4) body->code = codes[i % 4];
-        if (i % 2 == 0) body->u.stmVideo.localAddr.type = static_cast<uint32_t>(i % 4);
+        if (i % 2 == 0) {
+            body->u.stmVideo.localAddr.type = static_cast<uint32_t>(i % 4);
+            body->u.stmVideo.dir = static_cast<uint32_t>(i % 5);
+            body->u.stmVideo.encoder = 0;
+        }
         record.type = 0;
         record.targetModule = VPMD_VIDEO_CMDEVT_TARGET;
         pty.writeRecord(record);
