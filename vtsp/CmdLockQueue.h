@@ -11,6 +11,8 @@
 
 #include <deque>
 
+#include "ScopedPthreadLock.h"
+
 namespace android {
 
 template <typename T>
@@ -38,13 +40,13 @@ public:
     CmdLockQueue& operator=(const CmdLockQueue&) = delete;
 
     void start() {
-        Lock lock(mMutex);
+        ScopedPthreadLock lock(mMutex);
         mState = QUEUE_RUNNING;
     }
 
     void pushAndSignal(const T& elem) {
         {
-            Lock lock(mMutex);
+            ScopedPthreadLock lock(mMutex);
             if (mState != QUEUE_RUNNING) {
                 __android_log_print(ANDROID_LOG_ERROR, "VTSPManager", "%s: failed to push elem",
                                     "pushAndSignal");
@@ -57,7 +59,7 @@ public:
 
     // Takes the front element into `out`; false once the queue is closed.
     bool waitAndPop(T& out) {
-        Lock lock(mMutex);
+        ScopedPthreadLock lock(mMutex);
         if (mState == QUEUE_CLOSED) return false;
         while (mQueue.empty()) {
             pthread_cond_wait(&mCond, &mMutex);
@@ -69,14 +71,14 @@ public:
     }
 
     void reset() {
-        Lock lock(mMutex);
+        ScopedPthreadLock lock(mMutex);
         drain();
         mState = QUEUE_STOPPED;
     }
 
     void destroy() {
         {
-            Lock lock(mMutex);
+            ScopedPthreadLock lock(mMutex);
             drain();
             mState = QUEUE_CLOSED;
         }
@@ -85,26 +87,15 @@ public:
 
     // Snapshot for diagnostics and tests.
     State state() {
-        Lock lock(mMutex);
+        ScopedPthreadLock lock(mMutex);
         return static_cast<State>(mState);
     }
     size_t size() {
-        Lock lock(mMutex);
+        ScopedPthreadLock lock(mMutex);
         return mQueue.size();
     }
 
 private:
-    class Lock {
-    public:
-        explicit Lock(pthread_mutex_t& m) : mM(m) { pthread_mutex_lock(&mM); }
-        ~Lock() { pthread_mutex_unlock(&mM); }
-        Lock(const Lock&) = delete;
-        Lock& operator=(const Lock&) = delete;
-
-    private:
-        pthread_mutex_t& mM;
-    };
-
     // Releases the elements one by one from the front, under the lock.
     void drain() {
         while (!mQueue.empty()) mQueue.pop_front();

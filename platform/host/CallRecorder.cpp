@@ -11,8 +11,11 @@ std::string argText(long long value) {
 
 std::string argText(const char* text) {
     if (text == nullptr) return "NULL";
+    // Keeps trace lines readable when a caller passes a very long text.
+    constexpr size_t kShown = 200;
+    const size_t length = strlen(text);
     std::string out = "\"";
-    for (const char* p = text; *p != '\0'; ++p) {
+    for (const char* p = text; *p != '\0' && p < text + kShown; ++p) {
         const unsigned char c = static_cast<unsigned char>(*p);
         if (c == '"' || c == '\\') {
             out += '\\';
@@ -25,7 +28,9 @@ std::string argText(const char* text) {
             out += static_cast<char>(c);
         }
     }
-    return out + "\"";
+    out += "\"";
+    if (length > kShown) out += "...(" + std::to_string(length) + " bytes)";
+    return out;
 }
 
 std::string outText(long long value) {
@@ -40,6 +45,11 @@ std::string codecText(const tagMVD_CODEC* codec) {
              codec->aiWord[MVD_CODEC_WORD_FRAMERATE], codec->aiWord[MVD_CODEC_WORD_WIDTH],
              codec->aiWord[MVD_CODEC_WORD_HEIGHT]);
     return text;
+}
+
+int recordCall(const std::string& function, std::vector<std::string> args, int natural) {
+    CallRecorder& r = CallRecorder::instance();
+    return r.record(function, std::move(args), r.resultFor(function, natural));
 }
 
 std::string Call::text() const {

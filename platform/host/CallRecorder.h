@@ -19,6 +19,10 @@ std::string argText(const char* text);
 std::string outText(long long value);
 std::string codecText(const tagMVD_CODEC* codec);
 
+// Records a call whose only effect is its result: the test's override, or
+// `natural`.
+int recordCall(const std::string& function, std::vector<std::string> args, int natural = 0);
+
 class CallRecorder {
 public:
     static CallRecorder& instance();

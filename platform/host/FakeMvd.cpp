@@ -45,15 +45,10 @@ tagMVD_CODEC defaultCodec() {
     return codec;
 }
 
-int plain(const char* function, std::vector<std::string> args) {
-    CallRecorder& r = CallRecorder::instance();
-    return r.record(function, std::move(args), r.resultFor(function, 0));
-}
-
 int onStream(const char* function, unsigned int id, std::vector<std::string> extra = {}) {
     std::vector<std::string> args{argText(id)};
     for (auto& a : extra) args.push_back(std::move(a));
-    return plain(function, std::move(args));
+    return recordCall(function, std::move(args));
 }
 
 }  // namespace
@@ -154,8 +149,8 @@ int Mvd_ArsSetParm(unsigned int iStrmId, int iMinBitRate, int iMaxBitRate, int i
                      argText(iFrameRate)});
 }
 
-int Mvd_SuspendAllStrm(void) { return plain("Mvd_SuspendAllStrm", {}); }
-int Mvd_ResumeAllStrm(void) { return plain("Mvd_ResumeAllStrm", {}); }
+int Mvd_SuspendAllStrm(void) { return recordCall("Mvd_SuspendAllStrm", {}); }
+int Mvd_ResumeAllStrm(void) { return recordCall("Mvd_ResumeAllStrm", {}); }
 
 int Mvd_TptEnableTmmbr(unsigned int iStrmId, int bEnable) {
     return onStream("Mvd_TptEnableTmmbr", iStrmId, {argText(bEnable)});

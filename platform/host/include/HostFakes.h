@@ -50,6 +50,26 @@ bool getMvdCodec(unsigned int streamId, tagMVD_CODEC* codec);
 // Streams that are open in the fake engine, ascending.
 std::vector<unsigned int> openMvdStreams();
 
+// Video library: calls the listener the system registered, on the calling
+// thread, as the library's event thread would. False when none is registered.
+bool fireZmfEvent(int event, const char* json, int arg = 0);
+bool zmfListenerRegistered();
+bool zmfInitialized();
+
+// Camera driver: the handle the next successful camdrvOpen returns (handles
+// start at 0x100 and count up). Make camdrvOpen fail with setResult(..., 0).
+void setNextCameraHandle(int handle);
+// Handles of the captures that are open, ascending.
+std::vector<int> openCameras();
+
+// Render library: renderRemove sleeps this long before it removes the render,
+// so a test can show that nobody waits for it.
+void setRenderRemoveDelayMs(int ms);
+// Ids of the renders that are added, ascending.
+std::vector<std::string> activeRenders();
+// Blocks until `count` renderRemove calls have completed in all; false on timeout.
+bool waitForRenderRemoves(size_t count, int timeoutMs = 5000);
+
 }  // namespace hostfakes
 
 #endif  // QUELLBORN_HOST_HOSTFAKES_H

@@ -1,0 +1,25 @@
+// Receiver of the media engine's stream events (RTP first packet, break,
+// received), registered by the engine at start-up.
+#ifndef QUELLBORN_MME_JNI_MMEEVENTOBSERVER_H
+#define QUELLBORN_MME_JNI_MMEEVENTOBSERVER_H
+
+#include <atomic>
+
+namespace android {
+
+class MmeEventObserver {
+public:
+    virtual ~MmeEventObserver() = default;
+    virtual void mmeEvtUpdate(int event) = 0;
+};
+
+// Stores the observer (null unregisters); returns 0.
+int registerMmeEventObserver(MmeEventObserver* observer);
+
+// Read by the media engine's event thread while binder threads may register:
+// an atomic keeps the hand-over clean.
+extern std::atomic<MmeEventObserver*> m_pMmeEventObserver;
+
+}  // namespace android
+
+#endif  // QUELLBORN_MME_JNI_MMEEVENTOBSERVER_H

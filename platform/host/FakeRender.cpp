@@ -1,0 +1,116 @@
+// Recording stand-in for the render library. renderAdd takes the surface
+// over (the library keeps its own reference until the render is removed);
+// renderRemove can be made slow so a test sees that nobody waits for it.
+#include <gui/Surface.h>
+#include <utils/StrongPointer.h>
+
+#include <chrono>
+#include <condition_variable>
+#include <map>
+#include <thread>
+
+#include "CallRecorder.h"
+#include "render.h"
+
+namespace hostfakes {
+namespace {
+
+struct RenderState {
+    std::map<std::string, android::sp<android::Surface>> renders;
+    int removeDelayMs = 0;
+    size_t removesDone = 0;
+};
+
+std::condition_variable gRemoved;
+
+RenderState& state() {
+    static RenderState* s = [] {
+        auto* fresh = new RenderState();
+        CallRecorder::instance().addResetHook([fresh] {
+            RenderState old;
+            {
+                std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+                std::swap(*fresh, old);
+            }
+            // `old` releases the surfaces here, outside the lock.
+        });
+        return fresh;
+    }();
+    return *s;
+}
+
+}  // namespace
+
+void setRenderRemoveDelayMs(int ms) {
+    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+    state().removeDelayMs = ms;
+}
+
+std::vector<std::string> activeRenders() {
+    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+    std::vector<std::string> ids;
+    for (const auto& entry : state().renders) ids.push_back(entry.first);
+    return ids;
+}
+
+bool waitForRenderRemoves(size_t count, int timeoutMs) {
+    std::unique_lock<std::mutex> lock(CallRecorder::instance().stateMutex());
+    return gRemoved.wait_for(lock, std::chrono::milliseconds(timeoutMs),
+                             [count] { return state().removesDone >= count; });
+}
+
+}  // namespace hostfakes
+
+using namespace hostfakes;
+
+extern "C" {
+
+int renderInit(void) { return recordCall("renderInit", {}); }
+int renderTerm(void) { return recordCall("renderTerm", {}); }
+
+int renderAdd(android::Surface* pSurface, const char* pcRenderId) {
+    // Taken over whatever the outcome: the caller keeps no reference.
+    android::sp<android::Surface> surface(pSurface);
+    CallRecorder& r = CallRecorder::instance();
+    const int result = r.resultFor("renderAdd", pSurface != nullptr && pcRenderId != nullptr ? 0 : -1);
+    if (result == 0) {
+        std::lock_guard<std::mutex> lock(r.stateMutex());
+        state().renders[pcRenderId] = surface;
+    }
+    return r.record("renderAdd", {pSurface != nullptr ? "surface" : "NULL", argText(pcRenderId)},
+                    result);
+}
+
+int renderRotate(const char* pcRenderId, int iAngle) {
+    return recordCall("renderRotate", {argText(pcRenderId), argText(iAngle)});
+}
+
+int renderRemove(const char* pcRenderId) {
+    CallRecorder& r = CallRecorder::instance();
+    int delayMs;
+    {
+        std::lock_guard<std::mutex> lock(r.stateMutex());
+        delayMs = state().removeDelayMs;
+    }
+    if (delayMs > 0) std::this_thread::sleep_for(std::chrono::milliseconds(delayMs));
+    android::sp<android::Surface> released;
+    {
+        std::lock_guard<std::mutex> lock(r.stateMutex());
+        if (pcRenderId != nullptr) {
+            auto it = state().renders.find(pcRenderId);
+            if (it != state().renders.end()) {
+                released = it->second;
+                state().renders.erase(it);
+            }
+        }
+    }
+    const int result = recordCall("renderRemove", {argText(pcRenderId)});
+    {
+        std::lock_guard<std::mutex> lock(r.stateMutex());
+        ++state().removesDone;
+    }
+    gRemoved.notify_all();
+    return result;
+}
+
+}  // extern "C"

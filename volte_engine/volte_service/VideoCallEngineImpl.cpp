@@ -1,0 +1,195 @@
+// The engine's lifecycle, its process-wide instance and client notification.
+#include "VideoCallEngineImpl.h"
+
+#include <android/log.h>
+
+#include "ScopedPthreadLock.h"
+#include "VtspManager.h"
+#include "camdrv.h"
+#include "render.h"
+
+namespace android {
+
+namespace {
+
+constexpr const char* kTag = "VideoCallEngineImpl";
+constexpr const char* kCamdrvLibPath = "system/lib64";
+
+// Media engine stream events the client hears about.
+constexpr int EN_MVD_EVNT_STRM_RTP_BREAK = 22;
+constexpr int EN_MVD_EVNT_STRM_RTP_RECVED = 23;
+
+#define LOGI(...) __android_log_print(ANDROID_LOG_INFO, kTag, __VA_ARGS__)
+
+std::mutex gInstanceLock;
+int gInstanceUsers = 0;
+
+}  // namespace
+
+VideoCallEngineImpl* VideoCallEngineImpl::sInstance = nullptr;
+
+VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
+    std::lock_guard<std::mutex> lock(gInstanceLock);
+    if (sInstance == nullptr) {
+        LOGI("Create new Instance");
+        sInstance = new VideoCallEngineImpl();
+    }
+    return sInstance;
+}
+
+VideoCallEngineImpl* VideoCallEngineImpl::acquireInstance() {
+    VideoCallEngineImpl* engine = getInstance();
+    std::lock_guard<std::mutex> lock(gInstanceLock);
+    ++gInstanceUsers;
+    return engine;
+}
+
+void VideoCallEngineImpl::releaseInstance(VideoCallEngineImpl* engine) {
+    {
+        std::lock_guard<std::mutex> lock(gInstanceLock);
+        if (engine == nullptr || engine != sInstance) return;
+        if (--gInstanceUsers > 0) return;
+        gInstanceUsers = 0;
+        sInstance = nullptr;
+    }
+    delete engine;
+}
+
+VideoCallEngineImpl::VideoCallEngineImpl()
+        : mCameraSize(-1),
+          mCameraId(-1),
+          mAutoRotate(1),
+          mDeviceOrientation(0),
+          mScreenOrientation(0),
+          mRemoteRotation(0),
+          mCaptureHandle(0),
+          mOpenCameraId(-1),
+          mLocalRenderStarted(false),
+          mRemoteRenderId(kRemoteRenderName),
+          mRemoteRenderStarted(false),
+          mUplinkQos(0),
+          mLoopback(false),
+          mLoopbackStream(0),
+          mVtspManager(nullptr) {
+    pthread_mutex_init(&mLock, nullptr);
+    mVtspManager = VtspManager::getInstance();
+    LOGI("Construct");
+    mVtspManager->init();
+}
+
+VideoCallEngineImpl::~VideoCallEngineImpl() {
+    LOGI("Destruct");
+    camdrvTerm();
+    renderTerm();
+    zmfTerminate();
+    // The event paths keep raw pointers to their observer: a deleted engine
+    // must not be called back.
+    ZmfEventObserver* self = this;
+    m_pZmfEventObserver.compare_exchange_strong(self, nullptr);
+    MmeEventObserver* mmeSelf = this;
+    m_pMmeEventObserver.compare_exchange_strong(mmeSelf, nullptr);
+    {
+        ScopedPthreadLock lock(mLock);
+        mNotifyCallback.clear();
+    }
+    pthread_mutex_destroy(&mLock);
+    mPreviewSurface.clear();
+    mRemoteSurface.clear();
+}
+
+int VideoCallEngineImpl::loadZmf(int value, const char* packageName) {
+    LOGI("loadZmf");
+    zmfInitialize();
+    registerZmfEventObserver(this);
+    registerMmeEventObserver(this);
+    camdrvInit(packageName, value, kCamdrvLibPath);
+    renderInit();
+    return 0;
+}
+
+int VideoCallEngineImpl::initMme() {
+    return 0;
+}
+
+void VideoCallEngineImpl::init(int loopback) {
+    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    LOGI("init, loopback? %d E", loopback);
+    mLoopback = loopback != 0;
+    mCameraId = -1;
+    mUplinkQos = 0;
+    mDeviceOrientation = 0;
+    mScreenOrientation = 0;
+    mRemoteRotation = 0;
+    mRemoteSurface.clear();
+    mPreviewSurface.clear();
+    mCameraSize = -1;
+    if (mLoopback) startLoopBack();
+    LOGI("init, loopback? %d X", mLoopback ? 1 : 0);
+}
+
+void VideoCallEngineImpl::setNotifyCallback(const sp<IVideoCallEngineCallback>& callback) {
+    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    LOGI("%s, callback %p", "setNotifyCallback", callback.get());
+    // Only client operations change the callback, and they hold mOpLock, so
+    // it can be tested here without mLock.
+    if (callback != nullptr && mNotifyCallback != nullptr) {
+        LOGI("VCE is not released as expected");
+        release();
+    }
+    ScopedPthreadLock lock(mLock);
+    mNotifyCallback = callback;
+}
+
+void VideoCallEngineImpl::release() {
+    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    LOGI("release");
+    mAutoRotate = 1;
+    mDeviceOrientation = 0;
+    mScreenOrientation = 0;
+    mRemoteRotation = 0;
+    setRemoteSurface(nullptr);
+    setPreviewSurface(nullptr);
+    setCameraId(-1);
+    if (mLoopback) stopLoopBack();
+    {
+        ScopedPthreadLock lock(mLock);
+        mNotifyCallback.clear();
+    }
+    LOGI("release X");
+}
+
+int VideoCallEngineImpl::notifyLocked(int event, const int* args) {
+    ScopedPthreadLock lock(mLock);
+    if (mNotifyCallback == nullptr) {
+        LOGI("notifyCallback null");
+        return -1;
+    }
+    // The client's handler runs while mLock is held, so a callback change
+    // waits for the notification and never races it.
+    if (args == nullptr) {
+        mNotifyCallback->notifyCallback(event);
+    } else {
+        mNotifyCallback->notifyCallback(event, args[0], args[1], args[2]);
+    }
+    return 0;
+}
+
+int VideoCallEngineImpl::notifyCallback(int event) {
+    return notifyLocked(event, nullptr);
+}
+
+int VideoCallEngineImpl::notifyCallback(int event, int arg1, int arg2, int arg3) {
+    const int args[3] = {arg1, arg2, arg3};
+    return notifyLocked(event, args);
+}
+
+void VideoCallEngineImpl::mmeEvtUpdate(int event) {
+    LOGI("%s evt: %d", "mmeEvtUpdate", event);
+    if (event == EN_MVD_EVNT_STRM_RTP_BREAK) {
+        notifyCallback(VCE_EVENT_RTP_BREAK);
+    } else if (event == EN_MVD_EVNT_STRM_RTP_RECVED) {
+        notifyCallback(VCE_EVENT_RTP_RECEIVED);
+    }
+}
+
+}  // namespace android

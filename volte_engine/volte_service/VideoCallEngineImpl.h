@@ -1,0 +1,133 @@
+// The single video call engine behind the binder service: camera, renders,
+// display orientation, uplink QoS, the still-image substitute, the video
+// library's events, client notification and a local loopback mode.
+//
+// Sources by subject: VideoCallEngineImpl.cpp (lifecycle and notification),
+// VideoCallEngineImplCamera.cpp, VideoCallEngineImplRender.cpp,
+// VideoCallEngineImplListener.cpp (video library events) and
+// VideoCallEngineImplLoopback.cpp.
+//
+// Locking: the client's operations arrive on several binder threads; one
+// engine-wide lock (mOpLock, recursive because operations build on each
+// other) serialises them. mLock guards only the client callback and is held
+// for each notification; it is always taken after mOpLock, never before.
+#ifndef QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
+#define QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
+
+#include <gui/IGraphicBufferProducer.h>
+#include <pthread.h>
+#include <utils/StrongPointer.h>
+
+#include <cstdint>
+#include <mutex>
+
+#include "IVideoCallEngineCallback.h"
+#include "MmeEventObserver.h"
+#include "ZmfEventObserver.h"
+
+namespace android {
+
+class VtspManager;
+
+class VideoCallEngineImpl : public ZmfEventObserver, public MmeEventObserver {
+public:
+    // Client events.
+    enum {
+        VCE_EVENT_REMOTE_VIDEO_SIZE = 11,
+        VCE_EVENT_RTP_BREAK = 14,
+        VCE_EVENT_RTP_RECEIVED = 15,
+    };
+
+    // The process's engine, created on first use.
+    static VideoCallEngineImpl* getInstance();
+    // The service's hold on the engine: each service object takes one with
+    // acquireInstance() and gives it back with releaseInstance(); the engine
+    // is deleted when the last is given back, and sInstance forgets it, so a
+    // deleted engine is never reached again. A later getInstance() builds a
+    // new one.
+    static VideoCallEngineImpl* acquireInstance();
+    static void releaseInstance(VideoCallEngineImpl* engine);
+
+    VideoCallEngineImpl();
+    ~VideoCallEngineImpl() override;
+    VideoCallEngineImpl(const VideoCallEngineImpl&) = delete;
+    VideoCallEngineImpl& operator=(const VideoCallEngineImpl&) = delete;
+
+    // Lifecycle and notification.
+    int loadZmf(int value, const char* packageName);
+    int initMme();
+    void init(int loopback);
+    void setNotifyCallback(const sp<IVideoCallEngineCallback>& callback);
+    void release();
+    int notifyCallback(int event);
+    int notifyCallback(int event, int arg1, int arg2, int arg3);
+    void mmeEvtUpdate(int event) override;
+
+    // Video library events.
+    void zmfRenderEvtUpdate(int event, const char* renderId, int sourceType, int width,
+                            int height) override;
+    void zmfCaptureEvtUpdate(int event, const char* captureId, int width, int height,
+                             int frameRate) override;
+
+    // Camera.
+    int setCameraId(int id);
+    long startCapture(int id);
+    int stopCapture(long handle);
+    int restartCapture(long handle, int size);
+    void setCameraPreviewSize(int size);
+    void setDisplayOrientation(int device, int screen, int autoRotate);
+    void setUplinkQos(int kbps);
+    int getCameraSizeFromQos();
+
+    // Renders.
+    void setRemoteSurface(const sp<IGraphicBufferProducer>& producer);
+    void setPreviewSurface(const sp<IGraphicBufferProducer>& producer);
+    int addRender(const sp<IGraphicBufferProducer>& producer, const char* renderId);
+    int removeRender(const char* renderId);
+    static void* RenderRemoveThreadWrapper(void* renderId);
+    void hideLocalImage(bool enable, const char* path);
+
+    // Loopback.
+    void startLoopBack();
+    void stopLoopBack();
+
+    // Capture name of a camera id: also the capture's render id.
+    static const char* captureName(int cameraId);
+
+    sp<IGraphicBufferProducer> mRemoteSurface;
+    sp<IGraphicBufferProducer> mPreviewSurface;
+    int mCameraSize;
+    int mCameraId;
+    int mAutoRotate;
+    int mDeviceOrientation;
+    int mScreenOrientation;
+    int mRemoteRotation;
+    pthread_mutex_t mLock;
+    sp<IVideoCallEngineCallback> mNotifyCallback;
+    int64_t mCaptureHandle;
+    int mOpenCameraId;
+    bool mLocalRenderStarted;
+    const char* mRemoteRenderId;
+    bool mRemoteRenderStarted;
+    int mUplinkQos;
+    bool mLoopback;
+    int mLoopbackStream;
+    VtspManager* mVtspManager;
+
+private:
+    int cameraAngle() const;
+    int displayAngle() const;
+    int notifyLocked(int event, const int* args);
+    // Starts a detached thread that removes a render (the engine does not wait).
+    void startRenderRemoval(const char* renderId);
+    bool addRenderFor(const char* caller, const sp<IGraphicBufferProducer>& producer,
+                      const char* renderId);
+
+    std::recursive_mutex mOpLock;
+
+    static VideoCallEngineImpl* sInstance;
+};
+
+}  // namespace android
+
+#endif  // QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H

@@ -1,0 +1,149 @@
+#include "ZmfEventObserver.h"
+
+#include <android/log.h>
+
+#include "Zmf.h"
+
+__attribute__((visibility("default"))) unsigned char _zmf = 0;
+
+namespace android {
+
+namespace {
+
+constexpr const char* kTag = "VideoCallEngineZmf";
+
+#define LOGI(...) __android_log_print(ANDROID_LOG_INFO, kTag, __VA_ARGS__)
+#define LOGE(...) __android_log_print(ANDROID_LOG_ERROR, kTag, __VA_ARGS__)
+
+// Event numbers the library reports for captures and renders.
+constexpr int kFirstEvent = 20;
+constexpr int kLastEvent = 30;
+constexpr int kCaptureStarted = 20;
+constexpr int kCaptureStopped = 21;
+constexpr int kCaptureFace = 22;
+constexpr int kNotScanned1 = 23;
+constexpr int kNotScanned2 = 24;
+constexpr int kRenderAdded = 25;
+constexpr int kRenderStarted = 26;
+constexpr int kRenderSizeA = 27;
+constexpr int kRenderSize = 28;
+constexpr int kRenderRemoved = 29;
+constexpr int kCaptureSize = 30;
+
+constexpr const char* kTemplateCapture =
+        "{\"Capture\":\"%s\",\"Width\":%d,\"Height\":%d,\"FrameRate\":%d}";
+constexpr const char* kTemplateCaptureId = "{\"Capture\":\"%s\"}";
+constexpr const char* kTemplateCaptureFace =
+        "{\"Capture\":\"%s\",\"Face\":%d,\"Width\":%d,\"Height\":%d}";
+constexpr const char* kTemplateRender =
+        "{\"Render\":\"%s\",\"SourceType\":%d,\"Width\":%d,\"Height\":%d}";
+constexpr const char* kTemplateRenderWindowSize =
+        "{\"Render\":\"%s\",\"SourceType\":%d,\"Window\":%ld,\"Width\":%d,\"Height\":%d}";
+constexpr const char* kTemplateRenderWindow =
+        "{\"Render\":\"%s\",\"SourceType\":%d,\"Window\":%ld}";
+
+// Values scanned out of one event. The id buffer is the size the library
+// bounds %s to; the library never writes past it.
+struct EventValues {
+    char id[ZMF_JSON_TEXT_SIZE] = {};
+    int sourceType = 0;
+    int face = 0;
+    int width = 0;
+    int height = 0;
+    int frameRate = 0;
+    long window = 0;  // the platform's long: 32 bits on the device, 64 on the host
+};
+
+bool scanned(int got, int expected) {
+    if (got == expected) return true;
+    LOGE("scanf json failed");
+    return false;
+}
+
+bool scanEvent(int event, const char* json, EventValues& v) {
+    switch (event) {
+        case kCaptureStarted:
+        case kCaptureSize:
+            return scanned(Zmf_ScanfJson(json, kTemplateCapture, v.id, &v.width, &v.height,
+                                         &v.frameRate), 4);
+        case kCaptureStopped:
+            return scanned(Zmf_ScanfJson(json, kTemplateCaptureId, v.id), 1);
+        case kCaptureFace:
+            return scanned(Zmf_ScanfJson(json, kTemplateCaptureFace, v.id, &v.face, &v.width,
+                                         &v.height), 4);
+        case kRenderAdded:
+            return scanned(Zmf_ScanfJson(json, kTemplateRender, v.id, &v.sourceType, &v.width,
+                                         &v.height), 4);
+        case kRenderStarted:
+        case kRenderSizeA:
+        case kRenderSize:
+            return scanned(Zmf_ScanfJson(json, kTemplateRenderWindowSize, v.id, &v.sourceType,
+                                         &v.window, &v.width, &v.height), 5);
+        case kRenderRemoved:
+            return scanned(Zmf_ScanfJson(json, kTemplateRenderWindow, v.id, &v.sourceType,
+                                         &v.window), 3);
+        default:
+            return false;
+    }
+}
+
+}  // namespace
+
+std::atomic<ZmfEventObserver*> m_pZmfEventObserver{nullptr};
+
+void zmfInitialize() {
+    LOGI("%s", "zmfInitialize");
+    if (__atomic_load_n(&_zmf, __ATOMIC_ACQUIRE) != 0) return;
+    Zmf_OnIntialize();
+    Zmf_VideoSetListener(listen);
+    __atomic_store_n(&_zmf, 1, __ATOMIC_RELEASE);
+}
+
+int zmfTerminate() {
+    LOGI("%s", "zmfTerminate");
+    if (__atomic_load_n(&_zmf, __ATOMIC_ACQUIRE) != 0) {
+        Zmf_VideoSetListener(nullptr);
+        Zmf_OnTerminate();
+        __atomic_store_n(&_zmf, 0, __ATOMIC_RELEASE);
+    }
+    return 0;
+}
+
+int registerZmfEventObserver(ZmfEventObserver* observer) {
+    LOGI("registerZmfEventObserver ");
+    m_pZmfEventObserver = observer;
+    return 0;
+}
+
+void listen(int event, const char* json, int /*arg*/) {
+    LOGI("%s, Evt:%s=%s", "listen", Zmf_GetEventName(event), json != nullptr ? json : "(null)");
+    if (event < kFirstEvent || event > kLastEvent) return;
+    if (event == kNotScanned1 || event == kNotScanned2) return;
+    if (json == nullptr) {
+        LOGE("scanf json failed");
+        return;
+    }
+    EventValues v;
+    if (!scanEvent(event, json, v)) return;
+
+    ZmfEventObserver* observer = m_pZmfEventObserver.load();
+    if (observer == nullptr) return;
+    switch (event) {
+        case kCaptureStarted:
+        case kCaptureSize:
+            observer->zmfCaptureEvtUpdate(event, v.id, v.width, v.height, v.frameRate);
+            break;
+        case kRenderStarted:
+            observer->zmfRenderEvtUpdate(event, v.id, v.sourceType, v.width, v.height);
+            break;
+        case kRenderSizeA:
+        case kRenderSize:
+            // Both report the render's size; the engine knows them as one event.
+            observer->zmfRenderEvtUpdate(kRenderSize, v.id, v.sourceType, v.width, v.height);
+            break;
+        default:
+            break;
+    }
+}
+
+}  // namespace android
