@@ -8,6 +8,7 @@ PACKAGES=(
   googletest libgtest-dev libgmock-dev
   android-libutils-dev android-liblog-dev android-libcutils-dev android-libbase-dev
   android-platform-frameworks-native-headers android-libnativehelper-dev
+  default-jdk-headless
 )
 
 missing=()

@@ -2,6 +2,7 @@
 
 #include <cstdlib>
 #include <cstring>
+#include <thread>
 
 namespace hostfakes {
 
@@ -50,6 +51,13 @@ std::string codecText(const tagMVD_CODEC* codec) {
 int recordCall(const std::string& function, std::vector<std::string> args, int natural) {
     CallRecorder& r = CallRecorder::instance();
     return r.record(function, std::move(args), r.resultFor(function, natural));
+}
+
+int runOnEngineThread(const std::function<int()>& fn) {
+    int result = 0;
+    std::thread thread([&] { result = fn(); });
+    thread.join();
+    return result;
 }
 
 std::string Call::text() const {

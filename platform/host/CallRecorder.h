@@ -23,6 +23,10 @@ std::string codecText(const tagMVD_CODEC* codec);
 // `natural`.
 int recordCall(const std::string& function, std::vector<std::string> args, int natural = 0);
 
+// Runs `fn` on a new native thread (as the media engine's own threads are:
+// unknown to any virtual machine), waits for it and returns its result.
+int runOnEngineThread(const std::function<int()>& fn);
+
 class CallRecorder {
 public:
     static CallRecorder& instance();

@@ -17,6 +17,8 @@ constexpr int kFail = -1;
 struct MvdState {
     unsigned int nextId = 1;
     std::map<unsigned int, tagMVD_CODEC> streams;
+    std::map<unsigned int, tagMVD_RTCP_STA> stats;
+    PFN_MVDEVNTPROC eventProc = nullptr;
 };
 
 MvdState& state() {
@@ -69,6 +71,24 @@ bool getMvdCodec(unsigned int streamId, tagMVD_CODEC* codec) {
     if (it == state().streams.end()) return false;
     *codec = it->second;
     return true;
+}
+
+void setRtcpStats(unsigned int streamId, const tagMVD_RTCP_STA& stats) {
+    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+    state().stats[streamId] = stats;
+}
+
+int fireMvdEvent(const tagMVD_EVNT& event) {
+    PFN_MVDEVNTPROC proc;
+    {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        proc = state().eventProc;
+    }
+    if (proc == nullptr) return kNotInstalled;
+    return runOnEngineThread([proc, event] {
+        tagMVD_EVNT copy = event;
+        return proc(&copy, 0);
+    });
 }
 
 std::vector<unsigned int> openMvdStreams() {
@@ -195,6 +215,33 @@ int Mvd_FileStartSendImage(unsigned int iStrmId, const char* pcFilePath) {
 
 int Mvd_FileStopSendImage(unsigned int iStrmId) {
     return onStream("Mvd_FileStopSendImage", iStrmId);
+}
+
+int Mvd_TaskStart(void) { return recordCall("Mvd_TaskStart", {}); }
+int Mvd_TaskStop(void) { return recordCall("Mvd_TaskStop", {}); }
+
+int Mvd_EvntSetCallback(PFN_MVDEVNTPROC pfnProc, int bEnable) {
+    const int result = recordCall("Mvd_EvntSetCallback",
+                                  {pfnProc != nullptr ? "proc" : "NULL", argText(bEnable)});
+    if (result == 0) {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        state().eventProc = pfnProc;
+    }
+    return result;
+}
+
+int Mvd_RtcpGetSta(unsigned int iStrmId, tagMVD_RTCP_STA* pstSta) {
+    tagMVD_RTCP_STA stats{};
+    bool known;
+    {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        const auto it = state().stats.find(iStrmId);
+        known = it != state().stats.end();
+        if (known) stats = it->second;
+    }
+    const int result = CallRecorder::instance().resultFor("Mvd_RtcpGetSta", known ? 0 : kFail);
+    if (result == 0 && pstSta != nullptr) *pstSta = stats;
+    return CallRecorder::instance().record("Mvd_RtcpGetSta", {argText(iStrmId)}, result);
 }
 
 }  // extern "C"

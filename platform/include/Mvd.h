@@ -56,6 +56,28 @@ int Mvd_CaptureDetach(unsigned int iStrmId);
 int Mvd_FileStartSendImage(unsigned int iStrmId, const char* pcFilePath);
 int Mvd_FileStopSendImage(unsigned int iStrmId);
 
+/* The video module's task. */
+int Mvd_TaskStart(void);
+int Mvd_TaskStop(void);
+
+/* An event of the video module: 32-bit words, word 0 the event number; the
+ * meaning of the others depends on the event. */
+enum { MVD_EVNT_WORDS = 16 };
+typedef struct tagMVD_EVNT {
+    int aiWord[MVD_EVNT_WORDS];
+} tagMVD_EVNT;
+
+typedef int (*PFN_MVDEVNTPROC)(tagMVD_EVNT* pstEvnt, unsigned int iCookie);
+int Mvd_EvntSetCallback(PFN_MVDEVNTPROC pfnProc, int bEnable);
+
+/* RTCP statistics of a stream: ten 32-bit words. */
+enum { MVD_RTCP_STA_WORDS = 10 };
+typedef struct tagMVD_RTCP_STA {
+    int aiWord[MVD_RTCP_STA_WORDS];
+} tagMVD_RTCP_STA;
+
+int Mvd_RtcpGetSta(unsigned int iStrmId, tagMVD_RTCP_STA* pstSta);
+
 #ifdef __cplusplus
 }
 #endif

@@ -11,6 +11,7 @@
 #include <vector>
 
 #include "Mvd.h"
+#include "Zpand.h"
 
 namespace hostfakes {
 
@@ -69,6 +70,34 @@ void setRenderRemoveDelayMs(int ms);
 std::vector<std::string> activeRenders();
 // Blocks until `count` renderRemove calls have completed in all; false on timeout.
 bool waitForRenderRemoves(size_t count, int timeoutMs = 5000);
+
+// Media engine runtime: the value Zos_Time answers (0 until set).
+void setZosTime(unsigned int now);
+// Prints through the sink the system installed with Zos_CfgSetLogDisp;
+// false when none is installed.
+bool zosPrint(const char* text);
+
+// Media engine: version texts (null allowed) and provisioning values.
+void setVersions(const char* melonVersion, const char* mmeVersion);
+void setProvValue(const std::string& key, int value);
+void setProvString(const std::string& key, const char* text);
+void setProvMapString(const std::string& key, int index, const char* text);
+// RTCP statistics Mvd_RtcpGetSta reports for a stream (others fail).
+void setRtcpStats(unsigned int streamId, const tagMVD_RTCP_STA& stats);
+
+// The media engine's own threads. Each call below runs on a new native
+// thread of the fake engine, which no virtual machine knows, waits for it and
+// returns what the system's function returned (kNotInstalled when the
+// system has installed none).
+constexpr int kNotInstalled = -1000;
+int fireMvdEvent(const tagMVD_EVNT& event);
+int fireZpandModPostDrv();
+int fireZpandTimerInit();
+int fireZpandTimerDestroy();
+// Starts the runtime's timer; its expiry callback is recorded as
+// "Zos_TimerActive(<flag>)" when the system calls it.
+int fireZpandTimerStart(unsigned int length);
+int fireZpandTimerStop();
 
 }  // namespace hostfakes
 
