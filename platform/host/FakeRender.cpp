@@ -21,7 +21,12 @@ struct RenderState {
     size_t removesDone = 0;
 };
 
-std::condition_variable gRemoved;
+// Removal threads are detached and may still signal while the process
+// exits, so the condition variable is never destroyed (like the state).
+std::condition_variable& removed() {
+    static auto* cond = new std::condition_variable();
+    return *cond;
+}
 
 RenderState& state() {
     static RenderState* s = [] {
@@ -55,8 +60,8 @@ std::vector<std::string> activeRenders() {
 
 bool waitForRenderRemoves(size_t count, int timeoutMs) {
     std::unique_lock<std::mutex> lock(CallRecorder::instance().stateMutex());
-    return gRemoved.wait_for(lock, std::chrono::milliseconds(timeoutMs),
-                             [count] { return state().removesDone >= count; });
+    return removed().wait_for(lock, std::chrono::milliseconds(timeoutMs),
+                              [count] { return state().removesDone >= count; });
 }
 
 }  // namespace hostfakes
@@ -109,7 +114,7 @@ int renderRemove(const char* pcRenderId) {
         std::lock_guard<std::mutex> lock(r.stateMutex());
         ++state().removesDone;
     }
-    gRemoved.notify_all();
+    removed().notify_all();
     return result;
 }
 
