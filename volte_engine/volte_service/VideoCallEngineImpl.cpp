@@ -114,6 +114,9 @@ int VideoCallEngineImpl::initMme() {
 void VideoCallEngineImpl::init(int loopback) {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("init, loopback? %d E", loopback);
+    // A loopback stream the previous call left open would otherwise run on
+    // with nothing left to close it.
+    if (mLoopbackStream != 0) stopLoopBack();
     mLoopback = loopback != 0;
     mCameraId = -1;
     mUplinkQos = 0;

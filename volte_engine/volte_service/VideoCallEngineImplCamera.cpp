@@ -121,7 +121,9 @@ int VideoCallEngineImpl::setCameraId(int id) {
         return -1;
     }
     if (mOpenCameraId != kNoCamera) {
-        if (mLoopback) Mvd_CaptureAttach(mLoopbackStream, captureName(mOpenCameraId));
+        if (mLoopback && mLoopbackStream != 0) {
+            Mvd_CaptureAttach(mLoopbackStream, captureName(mOpenCameraId));
+        }
         mVtspManager->mCmdCallback->setCaptureId(captureName(mOpenCameraId));
         // A preview surface given while the camera was closed is shown now,
         // without the client having to hand it over again.

@@ -72,8 +72,12 @@ void VideoCallEngineImpl::startLoopBack() {
 void VideoCallEngineImpl::stopLoopBack() {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("%s", "stopLoopBack");
+    // Once closed, the id may be handed to another stream (a modem call's):
+    // it is forgotten so that a second release cannot close that stream.
+    if (mLoopbackStream == 0) return;
     Mvd_ProcStop(static_cast<unsigned int>(mLoopbackStream));
     Mvd_Close(static_cast<unsigned int>(mLoopbackStream));
+    mLoopbackStream = 0;
 }
 
 }  // namespace android

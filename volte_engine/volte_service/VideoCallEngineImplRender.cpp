@@ -159,7 +159,7 @@ void VideoCallEngineImpl::hideLocalImage(bool enable, const char* path) {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("hideLocalImage, enable = %d, path = %s", enable ? 1 : 0, path != nullptr ? path : "(null)");
     mVtspManager->mCmdCallback->sendReplacedImage(enable, path);
-    if (!mLoopback) return;
+    if (!mLoopback || mLoopbackStream == 0) return;
     if (enable) {
         Mvd_FileStartSendImage(mLoopbackStream, path);
     } else {

@@ -1,0 +1,255 @@
+// What the camera, render, listener, loopback and call suites share: a
+// fixture that drives the engine through the registered service as the IMS
+// client does, reads the platform call record from a mark, waits for the
+// engine's detached render removals, and plays the modem on the engine's pipe.
+#ifndef QUELLBORN_TESTS_ENGINE_ENGINETESTUTIL_H
+#define QUELLBORN_TESTS_ENGINE_ENGINETESTUTIL_H
+
+#include <android/log.h>
+#include <gtest/gtest.h>
+#include <gui/Surface.h>
+
+#include <algorithm>
+#include <chrono>
+#include <cstring>
+#include <initializer_list>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include "EngineHarness.h"
+#include "HostFakes.h"
+#include "LogCapture.h"
+#include "VideoCallEngineImpl.h"
+#include "VtspManager.h"
+#include "VtspRecord.h"
+
+namespace enginecase {
+
+inline constexpr const char* kEngineTag = "VideoCallEngineImpl";
+inline constexpr const char* kZmfTag = "VideoCallEngineZmf";
+inline constexpr const char* kFront = "Camera 1, Facing front, Orientation 270";
+inline constexpr const char* kBack = "Camera 0, Facing back, Orientation 90";
+inline constexpr const char* kRemote = "Remote";
+inline constexpr int kFirstHandle = 0x100;
+
+// Transaction codes of the service, as the client sends them.
+enum Code : uint32_t {
+    kSetSurface = 1,
+    kSetCallback = 2,
+    kEngineInit = 4,
+    kCleanSurface = 7,
+    kRelease = 8,
+    kCameraId = 9,
+    kCameraSize = 10,
+    kOrientation = 11,
+    kHideImage = 16,
+    kUplinkQos = 17,
+};
+enum Target : int32_t { kRemoteView = 0, kLocalView = 1 };
+
+inline std::string quoted(const std::string& text) { return "\"" + text + "\""; }
+
+template <typename Pred>
+bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seconds(5)) {
+    const auto deadline = std::chrono::steady_clock::now() + timeout;
+    while (!pred()) {
+        if (std::chrono::steady_clock::now() >= deadline) return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(2));
+    }
+    return true;
+}
+
+inline bool contains(const std::vector<std::string>& all, const std::string& one) {
+    return std::find(all.begin(), all.end(), one) != all.end();
+}
+
+// Each text appears in `all`, after the one before it.
+inline ::testing::AssertionResult inOrder(const std::vector<std::string>& all,
+                                          std::initializer_list<std::string> texts) {
+    auto from = all.begin();
+    for (const std::string& text : texts) {
+        const auto it = std::find(from, all.end(), text);
+        if (it == all.end()) {
+            ::testing::AssertionResult failure = ::testing::AssertionFailure();
+            failure << "\"" << text << "\" missing or out of order in:";
+            for (const std::string& line : all) failure << "\n  " << line;
+            return failure;
+        }
+        from = it + 1;
+    }
+    return ::testing::AssertionSuccess();
+}
+
+// The int32 words of a request the client's callback received.
+inline std::vector<int32_t> words(const hostbinder::RemoteBinder::Transaction& t) {
+    std::vector<int32_t> out(t.data.size() / sizeof(int32_t));
+    if (!out.empty()) memcpy(out.data(), t.data.data(), out.size() * sizeof(int32_t));
+    return out;
+}
+
+class EngineCase : public ::testing::Test {
+protected:
+    void SetUp() override {
+        ASSERT_NE(nullptr, enginetest::service());
+        // Every case starts from a released engine in normal mode and sees
+        // only its own lines and calls, also when several share a process.
+        const size_t removesBefore = completedRemoves();
+        send(kRelease);
+        send(kEngineInit, {0});
+        ASSERT_TRUE(eventually([&] {
+            return completedRemoves() >=
+                   removesBefore + log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender");
+        }));
+        hostfakes::setNextCameraHandle(kFirstHandle);
+        hostfakes::setNextMvdStreamId(1);
+        log.clear();
+        mRemovesBase = completedRemoves();
+        markCalls();
+    }
+
+    void TearDown() override {
+        settleRemovals();
+        for (const std::string& function : mOverrides) hostfakes::clearResult(function);
+        hostfakes::setRenderRemoveDelayMs(0);
+    }
+
+    static android::VideoCallEngineImpl* engine() { return android::VideoCallEngineImpl::getInstance(); }
+    static android::CmdCallbackMvd& dispatcher() { return *engine()->mVtspManager->mCmdCallback; }
+
+    // Sends a request as the client does and returns the reply's integer.
+    int32_t send(uint32_t code, std::initializer_list<int32_t> ints = {},
+                 const android::sp<android::IBinder>& binder = nullptr, const char* text = nullptr) {
+        const enginetest::Reply reply = enginetest::call(code, ints, binder, text);
+        EXPECT_EQ(android::NO_ERROR, reply.status) << "code " << code;
+        return reply.value;
+    }
+    int32_t setCamera(int32_t id) { return send(kCameraId, {id}); }
+    void setSize(int32_t size) { send(kCameraSize, {size}); }
+    void orient(int32_t device, int32_t screen, int32_t autoRotate) {
+        send(kOrientation, {device, screen, autoRotate});
+    }
+    // Hands over a fresh producer of the client's process for a view.
+    android::sp<hostbinder::RemoteBinder> setSurface(Target target) {
+        android::sp<hostbinder::RemoteBinder> producer = enginetest::remoteProducer();
+        EXPECT_EQ(0, send(kSetSurface, {target}, producer));
+        return producer;
+    }
+    void cleanSurface(Target target) { send(kCleanSurface, {target}); }
+    void hide(const char* path) { send(kHideImage, {1}, nullptr, path); }
+    void show() { send(kHideImage, {0}); }
+    android::sp<hostbinder::RemoteBinder> setCallback() {
+        android::sp<hostbinder::RemoteBinder> client = enginetest::remoteCallback();
+        send(kSetCallback, {}, client);
+        return client;
+    }
+
+    // The call record from the last mark on. Removals still running would
+    // land after the mark at random, so they are waited for first.
+    void markCalls() {
+        settleRemovals();
+        mMark = hostfakes::callCount();
+    }
+    std::vector<std::string> newCalls() const { return hostfakes::callTextsSince(mMark); }
+    std::vector<std::string> newCallsOf(const std::string& function) const {
+        std::vector<std::string> out;
+        for (const std::string& text : newCalls()) {
+            if (text.compare(0, function.size() + 1, function + "(") == 0) out.push_back(text);
+        }
+        return out;
+    }
+    bool called(const std::string& text) const { return contains(newCalls(), text); }
+
+    // The engine's own info lines, in order.
+    std::vector<std::string> engineLines() const {
+        std::vector<std::string> out;
+        for (const LogLine& line : log.linesWithTag(kEngineTag)) {
+            if (line.priority == ANDROID_LOG_INFO) out.push_back(line.text);
+        }
+        return out;
+    }
+    std::vector<std::string> engineLinesSince(size_t from) const {
+        std::vector<std::string> all = engineLines();
+        return std::vector<std::string>(all.begin() + static_cast<std::ptrdiff_t>(std::min(from, all.size())),
+                                        all.end());
+    }
+    bool logged(const std::string& text, int priority = ANDROID_LOG_INFO,
+                const char* tag = kEngineTag) const {
+        return log.contains(priority, tag, text);
+    }
+
+    // Waits until every render removal the engine started in this case has run.
+    void settleRemovals() {
+        EXPECT_TRUE(eventually([&] {
+            return completedRemoves() >=
+                   mRemovesBase + log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender");
+        })) << "render removals still pending";
+    }
+
+    // Makes a library function fail for the rest of the case.
+    void failCalls(const std::string& function, int result) {
+        hostfakes::setResult(function, result);
+        mOverrides.push_back(function);
+    }
+
+    // Plays the modem: starts a send-and-receive stream and waits for its
+    // bind request, which the link sends once the stream is configured.
+    void startStream(uint32_t streamId) {
+        vtspcodec::StreamCommand start;
+        start.code = android::_VTSP_CMD_STREAM_VIDEO_START;
+        start.streamId = streamId;
+        start.dir = android::VTSP_STREAM_DIR_SENDRECV;
+        start.localAddr = vtspcodec::address("10.0.0.1", 6000);
+        start.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
+        enginetest::modem().writeRecord(vtspcodec::streamRecord(start));
+        android::VPR_Comm record{};
+        ASSERT_TRUE(enginetest::modem().readRecord(&record)) << "no bind request";
+        const vtspcodec::BindRequest bind = vtspcodec::readBindRequest(record);
+        EXPECT_EQ(android::VPR_NET_CMD_BIND, bind.code);
+        EXPECT_EQ(static_cast<int32_t>(streamId), bind.streamId);
+        EXPECT_EQ("10.0.0.1", vtspcodec::addressText(bind.addr));
+        EXPECT_EQ(6000, bind.addr.port);
+    }
+    // Ends it; the engine stream `mvdStream` is then closed.
+    void endStream(uint32_t streamId, unsigned int mvdStream) {
+        vtspcodec::StreamCommand end;
+        end.code = android::_VTSP_CMD_STREAM_VIDEO_END;
+        end.streamId = streamId;
+        end.dir = android::VTSP_STREAM_DIR_SENDRECV;
+        const size_t from = hostfakes::callCount();
+        enginetest::modem().writeRecord(vtspcodec::streamRecord(end));
+        const std::string closed = "Mvd_Close(" + std::to_string(mvdStream) + ") = 0";
+        EXPECT_TRUE(eventually([&] { return contains(hostfakes::callTextsSince(from), closed); })) << closed;
+    }
+
+    LogCapture log;
+
+private:
+    static size_t completedRemoves() {
+        size_t n = 0;
+        for (const std::string& name : hostfakes::callNames()) n += name == "renderRemove";
+        return n;
+    }
+
+    size_t mMark = 0;
+    size_t mRemovesBase = 0;
+    std::vector<std::string> mOverrides;
+};
+
+inline std::string openText(int id, int handle, int width, int height, int fps) {
+    const bool front = id == 1;
+    return "camdrvOpen(" + quoted(front ? kFront : kBack) + ", " + std::to_string(id) + ", " +
+           (front ? "1, 270, " : "-1, 90, ") + std::to_string(width) + ", " + std::to_string(height) + ", " +
+           std::to_string(fps) + ") = " + std::to_string(handle);
+}
+inline std::string renderAddText(const char* id, int result = 0) {
+    return "renderAdd(surface, " + quoted(id) + ") = " + std::to_string(result);
+}
+inline std::string rotateText(const char* id, int angle) {
+    return "renderRotate(" + quoted(id) + ", " + std::to_string(angle) + ") = 0";
+}
+inline std::string removeText(const char* id) { return "renderRemove(" + quoted(id) + ") = 0"; }
+
+}  // namespace enginecase
+
+#endif  // QUELLBORN_TESTS_ENGINE_ENGINETESTUTIL_H
