@@ -1,6 +1,8 @@
 #!/usr/bin/env bash
 # Installs the Debian packages the host build, the tests and the tools need,
 # skipping those already present. Runs apt-get through sudo when not root.
+# Extra package names given as arguments are installed too (make msc asks
+# for mscgen this way; nothing else needs it).
 set -euo pipefail
 
 PACKAGES=(
@@ -9,6 +11,7 @@ PACKAGES=(
   android-libutils-dev android-liblog-dev android-libcutils-dev android-libbase-dev
   android-platform-frameworks-native-headers android-libnativehelper-dev
   default-jdk-headless
+  "$@"
 )
 
 missing=()

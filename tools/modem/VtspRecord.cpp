@@ -38,6 +38,31 @@ OSAL_NetAddress address(const std::string& ip, uint16_t port) {
     return a;
 }
 
+bool parseEndpoint(const std::string& text, OSAL_NetAddress* out) {
+    if (text == "none") {
+        *out = noAddress();
+        return true;
+    }
+    std::string host, port;
+    if (!text.empty() && text[0] == '[') {
+        const size_t close = text.find(']');
+        if (close == std::string::npos || close + 1 >= text.size() || text[close + 1] != ':') return false;
+        host = text.substr(1, close - 1);
+        port = text.substr(close + 2);
+    } else {
+        const size_t colon = text.rfind(':');
+        if (colon == std::string::npos) return false;
+        host = text.substr(0, colon);
+        port = text.substr(colon + 1);
+    }
+    if (host.empty() || host.find('\0') != std::string::npos || port.empty() || port.size() > 5 ||
+        port.find_first_not_of("0123456789") != std::string::npos) {
+        return false;
+    }
+    const unsigned long value = std::stoul(port);
+    return value <= 0xFFFF && parseAddress(host, static_cast<uint16_t>(value), out);
+}
+
 namespace {
 
 VPR_Comm emptyRecord(uint32_t type, uint32_t targetModule) {
@@ -125,6 +150,36 @@ std::string addressText(const OSAL_NetAddress& addr) {
             return text;
         default:
             return "-";
+    }
+}
+
+std::string endpointText(const OSAL_NetAddress& addr) {
+    if (addr.type == kAddrTypeIpv6 || addr.type == kAddrTypeIpv6Alt) {
+        uint8_t bytes[16];
+        for (int i = 0; i < 8; ++i) {
+            bytes[2 * i] = static_cast<uint8_t>(addr.ipv6[i] >> 8);
+            bytes[2 * i + 1] = static_cast<uint8_t>(addr.ipv6[i]);
+        }
+        char text[INET6_ADDRSTRLEN];
+        inet_ntop(AF_INET6, bytes, text, sizeof(text));
+        return "[" + std::string(text) + "]:" + std::to_string(addr.port);
+    }
+    const std::string ip = addressText(addr);
+    return ip == "-" ? ip : ip + ":" + std::to_string(addr.port);
+}
+
+const char* directionName(uint32_t dir) {
+    static const char* const kNames[] = {"ended", "inactive", "sendonly", "recvonly", "sendrecv"};
+    return dir < sizeof(kNames) / sizeof(kNames[0]) ? kNames[dir] : nullptr;
+}
+
+const char* commandName(int32_t code) {
+    switch (code) {
+        case _VTSP_CMD_CONFIG: return "CONFIG";
+        case _VTSP_CMD_STREAM_VIDEO_START: return "START";
+        case _VTSP_CMD_STREAM_VIDEO_MODITY: return "MODIFY";
+        case _VTSP_CMD_STREAM_VIDEO_END: return "END";
+        default: return nullptr;
     }
 }
 

@@ -20,6 +20,9 @@ OSAL_NetAddress noAddress();
 // "10.0.0.1" or "fe80::1" (host order groups; the port in host order too).
 bool parseAddress(const std::string& ip, uint16_t port, OSAL_NetAddress* out);
 OSAL_NetAddress address(const std::string& ip, uint16_t port);
+// "10.0.0.1:6000", "[fe80::1]:6000", "fe80::1:6000" (the last colon starts
+// the port) or "none" (no address); false for anything else.
+bool parseEndpoint(const std::string& text, OSAL_NetAddress* out);
 
 struct StreamCommand {
     int32_t code = android::_VTSP_CMD_STREAM_VIDEO_START;
@@ -66,6 +69,16 @@ BindRequest readBindRequest(const VPR_Comm& record);
 
 // "10.0.0.1" / "fe80:0:0:0:0:0:0:1" of a host-order address, "-" for none.
 std::string addressText(const OSAL_NetAddress& addr);
+
+// "10.0.0.1:6000" or "[2001:db8::1]:6000" (IPv6 compressed) of a host-order
+// address, "-" for none.
+std::string endpointText(const OSAL_NetAddress& addr);
+
+// Lower-case direction names ("ended" .. "sendrecv"); null for a value that
+// names no direction.
+const char* directionName(uint32_t dir);
+// Command code names ("START", "MODIFY", "END", "CONFIG"); null when unknown.
+const char* commandName(int32_t code);
 
 }  // namespace vtspcodec
 

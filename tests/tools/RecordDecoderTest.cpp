@@ -1,0 +1,146 @@
+// Decoding records as `vtsp decode` and the simulator's timeline show them:
+// host-order values, every target module, unknown codes and types, whole
+// streams with trailing bytes, and arbitrary bytes.
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <random>
+#include <sstream>
+
+#include "RecordDecoder.h"
+#include "StepSyntax.h"
+
+using android::VPR_Comm;
+
+namespace {
+
+VPR_Comm recordOf(const std::string& step) {
+    StepSyntax::Step parsed;
+    std::string error;
+    EXPECT_TRUE(StepSyntax::parse(step, &parsed, &error)) << error;
+    return parsed.record();
+}
+
+// A bind request as the link writes it: address in wire order.
+VPR_Comm bindRecord(int32_t stream, const std::string& endpoint) {
+    VPR_Comm record{};
+    android::VprNetBind bind{};
+    bind.code = android::VPR_NET_CMD_BIND;
+    bind.streamId = stream;
+    EXPECT_TRUE(vtspcodec::parseEndpoint(endpoint, &bind.addr));
+    android::swapAddress(bind.addr);
+    memcpy(record.body, &bind, sizeof(bind));
+    record.targetModule = android::VPMD_NET_TARGET;
+    record.recordLength = android::kVprCommSize;
+    return record;
+}
+
+std::string described(const VPR_Comm& record) {
+    std::string out;
+    for (const std::string& line : RecordDecoder::describe(record, 3)) out += line + "\n";
+    return out;
+}
+
+}  // namespace
+
+TEST(RecordDecoderSummary, OneLinePerTargetModule) {
+    EXPECT_EQ("START stream 1 sendrecv 10.0.0.1:6000 <-> 192.168.1.2:5000 pt 96 bw 500",
+              RecordDecoder::summary(recordOf("start stream=1 local=10.0.0.1:6000 remote=192.168.1.2:5000 bw=500")));
+    EXPECT_EQ("MODIFY stream 2 inactive [fe80::1]:4000 <-> no address (type 4) pt 97",
+              RecordDecoder::summary(recordOf("modify stream=2 dir=inactive local=[fe80::1]:4000 pt=97")));
+    EXPECT_EQ("END stream 3", RecordDecoder::summary(recordOf("end stream=3")));
+    EXPECT_EQ("CONFIG stream 1 rtcp 0x50 (NACK FIR)", RecordDecoder::summary(recordOf("config stream=1 rtcp=0x50")));
+    EXPECT_EQ("BIND stream 1 10.0.0.1:6000", RecordDecoder::summary(bindRecord(1, "10.0.0.1:6000")));
+    EXPECT_EQ("LIVENESS (modem is active)", RecordDecoder::summary(recordOf("raw target=8")));
+    EXPECT_EQ("target 5 (unknown) body 2a 00 00 00 00 00 00 00", RecordDecoder::summary(recordOf("raw target=5 code=42")));
+    EXPECT_EQ("code 42 (unknown command)", RecordDecoder::summary(recordOf("raw target=0 code=42")));
+    EXPECT_EQ("END stream 3 [type 2: dropped]", RecordDecoder::summary(recordOf("end stream=3 type=2")));
+}
+
+TEST(RecordDecoderDescribe, FieldsInHostOrderWithTheStepThatBuildsThem) {
+    const std::string text = described(recordOf(
+            "start stream=1 local=10.0.0.1:6000 remote=[2001:db8::2]:5000 pt=96,97 bw=500 rbw=400 ext=3 rtcp-ports=6001:5001"));
+    EXPECT_NE(std::string::npos, text.find("record 3  type 0  targetModule 0 (video command)  recordLength 3664\n"));
+    EXPECT_NE(std::string::npos, text.find("  START (code 81)  infc 0\n"));
+    EXPECT_NE(std::string::npos, text.find("  stream 1  dir 4 sendrecv  encoder 0\n"));
+    EXPECT_NE(std::string::npos, text.find("  payload types 96, 97\n"));
+    EXPECT_NE(std::string::npos, text.find("  local  10.0.0.1:6000  rtcp 6001  type 0 (IPv4)\n"));
+    EXPECT_NE(std::string::npos, text.find("  remote [2001:db8::2]:5000  rtcp 5001  type 2 (IPv6)\n"));
+    EXPECT_NE(std::string::npos, text.find("  bandwidth local 500 kbps, remote 400 kbps\n"));
+    EXPECT_NE(std::string::npos, text.find("  extension 0  extmap id 3 uri \"urn:3gpp:video-orientation\"\n"));
+    EXPECT_NE(std::string::npos, text.find("  step: start stream=1 dir=sendrecv local=10.0.0.1:6000 "
+                                           "remote=[2001:db8::2]:5000 pt=96,97 bw=500 rbw=400 ext=3 rtcp-ports=6001:5001\n"));
+
+    EXPECT_NE(std::string::npos, described(bindRecord(4, "[fe80::9]:7000"))
+                                         .find("  BIND (code 7)  stream 4  address [fe80::9]:7000  type 2 (IPv6)\n"));
+    EXPECT_NE(std::string::npos, described(recordOf("config stream=2 rtcp=0x91 on=0"))
+                                         .find("  template 23 (RTCP feedback)  on 0  stream 2  mask 0x91 (NACK TMMBR "
+                                               "+ignored)\n"));
+}
+
+TEST(RecordDecoderDescribe, UnknownThingsAreNamedWithAnExcerpt) {
+    EXPECT_NE(std::string::npos, described(recordOf("raw target=0 code=42"))
+                                         .find("  unknown command (code 42)  infc 0\n  body: 2a 00 00 00"));
+    EXPECT_NE(std::string::npos, described(recordOf("raw target=9 code=1"))
+                                         .find("unknown target module: the link drops it; body: 01 00 00 00"));
+    EXPECT_NE(std::string::npos, described(recordOf("start stream=1 type=5"))
+                                         .find("type 5: the link drops video commands whose type is not 0"));
+    VPR_Comm shifted = recordOf("end stream=1");
+    shifted.recordLength = 0x500e0000;
+    EXPECT_NE(std::string::npos, described(shifted).find("(not 3664: if the trailer looks like body bytes"));
+}
+
+TEST(RecordDecoderStream, CountsRecordsAndReportsTrailingBytes) {
+    const VPR_Comm records[] = {recordOf("start stream=1 local=10.0.0.1:6000"), recordOf("end stream=1")};
+    std::string bytes(reinterpret_cast<const char*>(records), sizeof(records));
+    bytes += std::string(10, '\x07');
+    std::istringstream in(bytes);
+    std::ostringstream out;
+    const RecordDecoder::StreamResult result = RecordDecoder::decodeStream(in, out);
+    EXPECT_EQ(2u, result.records);
+    EXPECT_EQ(10u, result.trailingBytes);
+    EXPECT_NE(std::string::npos, out.str().find("record 1  type 0"));
+    EXPECT_NE(std::string::npos, out.str().find("trailing 10 bytes after 2 whole records (7338 bytes is not a multiple "
+                                                "of 3664): 07 07 07 07 07 07 07 07 07 07\n"));
+}
+
+TEST(RecordDecoderStream, StepsOutputReadsBackAsTheSameRecords) {
+    const VPR_Comm records[] = {recordOf("start stream=1 local=[::1]:6000 remote=10.1.1.1:5000 ext=2"),
+                                recordOf("config stream=1 rtcp=0x10"), recordOf("raw target=8 type=1")};
+    std::istringstream in(std::string(reinterpret_cast<const char*>(records), sizeof(records)));
+    std::ostringstream out;
+    RecordDecoder::decodeStream(in, out, true);
+    std::istringstream steps(out.str());
+    std::vector<StepSyntax::Step> parsed;
+    std::string error;
+    ASSERT_TRUE(StepSyntax::parseLines(steps, &parsed, &error)) << error;
+    ASSERT_EQ(3u, parsed.size());
+    for (size_t i = 0; i < parsed.size(); ++i) {
+        const VPR_Comm again = parsed[i].record();
+        EXPECT_EQ(0, memcmp(&records[i], &again, sizeof(again))) << out.str();
+    }
+}
+
+TEST(RecordDecoderStream, ArbitraryBytesDecodeWithoutFault) {
+    std::mt19937 random(99);
+    for (int i = 0; i < 300; ++i) {
+        std::string bytes(random() % (3 * android::kVprCommSize), '\0');
+        for (char& c : bytes) c = static_cast<char>(random() % 256);
+        // Steer some records into each target module and known code.
+        for (size_t at = 0; at + android::kVprCommSize <= bytes.size(); at += android::kVprCommSize) {
+            const uint32_t targets[] = {0, 1, 8, static_cast<uint32_t>(random())};
+            const int32_t codes[] = {15, 81, 82, 88, 7};
+            const uint32_t target = targets[random() % 4];
+            const int32_t code = codes[random() % 5];
+            memcpy(&bytes[at + 3656], &target, sizeof(target));
+            if (random() % 2) memcpy(&bytes[at], &code, sizeof(code));
+        }
+        std::istringstream in(bytes);
+        std::ostringstream out, steps;
+        const RecordDecoder::StreamResult result = RecordDecoder::decodeStream(in, out);
+        EXPECT_EQ(bytes.size() / android::kVprCommSize, result.records);
+        EXPECT_EQ(bytes.size() % android::kVprCommSize, result.trailingBytes);
+        std::istringstream again(bytes);
+        RecordDecoder::decodeStream(again, steps, true);
+    }
+}

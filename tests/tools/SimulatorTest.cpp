@@ -1,0 +1,57 @@
+// A whole scenario played in-process against the real system: the verdicts
+// the simulator gives and the timeline it keeps. The engine and its link are
+// process singletons, so this suite plays one scenario (CTest runs each case
+// in a process of its own).
+#include <gtest/gtest.h>
+
+#include <sstream>
+
+#include "Simulator.h"
+
+TEST(SimulatorPlay, ReportsOnlyTheExpectationsThatDidNotHold) {
+    Scenario scenario;
+    std::string error;
+    ASSERT_TRUE(Scenario::parse("client callback\n"
+                                "client init\n"
+                                "modem start stream=3 local=10.0.0.1:6000 remote=192.168.1.2:5000\n"
+                                "expect bind stream=3 local=10.0.0.1:6000\n"
+                                "expect bind stream=3 local=10.0.0.2:6000\n"
+                                "expect call Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0\n"
+                                "expect no-call Mvd_Open\n"
+                                "media rtp-break\n"
+                                "expect event 14\n"
+                                "expect event 15\n"
+                                "expect log mmeEvtUpdate evt: 22\n"
+                                "client camera 1\n"
+                                "expect reply 0\n"
+                                "expect reply 3\n",
+                                &scenario, &error))
+            << error;
+    std::ostringstream out;
+    std::vector<std::string> failures;
+    std::vector<TimelineEntry> entries;
+    {
+        Simulator simulator(Simulator::Options{}, out);
+        failures = simulator.play(scenario);
+        entries = simulator.timeline().all();
+    }
+    ASSERT_EQ(4u, failures.size()) << out.str();
+    EXPECT_EQ(0u, failures[0].find("line 5: expect bind stream=3 local=10.0.0.2:6000: no such record since line 3; "
+                                   "records from the link:\n      BIND stream 3 10.0.0.1:6000"))
+            << failures[0];
+    EXPECT_EQ(0u, failures[1].find("line 7: expect no-call Mvd_Open: called:\n      Mvd_Open(\"10.0.0.1\", 6000, out=1) = 0"))
+            << failures[1];
+    EXPECT_EQ("line 10: expect event 15: not received since line 8; events:\n      event 14", failures[2]);
+    EXPECT_EQ("line 14: expect reply 3: the reply was 0", failures[3]);
+
+    const std::string text = out.str();
+    EXPECT_NE(std::string::npos, text.find("modem   -> link    START stream 3 sendrecv 10.0.0.1:6000 <-> 192.168.1.2:5000 pt 96\n"
+                                           "           media   Mvd_Open(\"10.0.0.1\", 6000, out=1) = 0\n"));
+    EXPECT_NE(std::string::npos, text.find("link    -> modem   BIND stream 3 10.0.0.1:6000\n"));
+    EXPECT_NE(std::string::npos, text.find("client  <- event 14 (RTP break)\n"));
+    EXPECT_NE(std::string::npos, text.find("expect  FAILED  reply 3\n"));
+    EXPECT_EQ(std::string::npos, text.find("  log     "));  // log lines only when verbose
+    size_t logs = 0;
+    for (const TimelineEntry& e : entries) logs += e.kind == TimelineEntry::Kind::kLog;
+    EXPECT_GT(logs, 0u);
+}

@@ -1,0 +1,80 @@
+#include "ModemActor.h"
+
+#include <poll.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <cstdlib>
+
+#include "RecordDecoder.h"
+
+using android::VPR_Comm;
+
+ModemActor::ModemActor(Timeline* timeline) : mTimeline(timeline) {
+    setenv("QUELLBORN_MODEM_PIPE", mPty.devicePath(), 1);
+    mReader = std::thread([this] { readLoop(); });
+}
+
+ModemActor::~ModemActor() {
+    mStop.store(true);
+    mReader.join();
+}
+
+void ModemActor::send(const StepSyntax::Step& step) {
+    const VPR_Comm record = step.record();
+    TimelineEntry entry;
+    entry.actor = "modem";
+    entry.target = "link";
+    entry.text = RecordDecoder::summary(record);
+    entry.mscFrom = "modem";
+    entry.mscTo = "link";
+    mTimeline->add(entry);
+    mPty.writeRecord(record);
+}
+
+void ModemActor::readLoop() {
+    // Bytes are gathered across polls: a record may arrive in pieces.
+    VPR_Comm record;
+    size_t got = 0;
+    while (!mStop.load()) {
+        struct pollfd pfd {mPty.masterFd(), POLLIN, 0};
+        const int ready = poll(&pfd, 1, 20);
+        if (ready <= 0 || (pfd.revents & POLLIN) == 0) {
+            if (ready > 0) usleep(20 * 1000);  // hang-up or error: nothing to read, do not spin
+            continue;
+        }
+        const ssize_t n = read(mPty.masterFd(), reinterpret_cast<char*>(&record) + got, sizeof(record) - got);
+        if (n <= 0) continue;
+        got += static_cast<size_t>(n);
+        if (got == sizeof(record)) {
+            take(record);
+            got = 0;
+        }
+    }
+}
+
+void ModemActor::take(const VPR_Comm& record) {
+    {
+        std::lock_guard<std::mutex> lock(mLock);
+        mRecords.push_back(record);
+    }
+    TimelineEntry entry;
+    entry.kind = TimelineEntry::Kind::kRecordOut;
+    entry.actor = "link";
+    entry.target = "modem";
+    entry.text = RecordDecoder::summary(record);
+    entry.mscFrom = "link";
+    entry.mscTo = "modem";
+    mTimeline->add(entry);
+}
+
+std::vector<VPR_Comm> ModemActor::recordsSince(size_t from) const {
+    std::lock_guard<std::mutex> lock(mLock);
+    if (from >= mRecords.size()) return {};
+    return std::vector<VPR_Comm>(mRecords.begin() + static_cast<std::ptrdiff_t>(from), mRecords.end());
+}
+
+size_t ModemActor::recordCount() const {
+    std::lock_guard<std::mutex> lock(mLock);
+    return mRecords.size();
+}
