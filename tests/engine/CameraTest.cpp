@@ -4,52 +4,49 @@
 #include "EngineTestUtil.h"
 
 using namespace enginecase;
-using Strings = std::vector<std::string>;
 
 namespace {
-
-struct Resolution {
-    int width;
-    int height;
-    int fps;
-};
-constexpr Resolution kVga15{480, 640, 15};
-constexpr Resolution kVga30{480, 640, 30};
-constexpr Resolution kQvga15{240, 320, 15};
-constexpr Resolution kQcif30{176, 144, 30};
-
-std::string opened(int id, int handle, const Resolution& r) {
-    return openText(id, handle, r.width, r.height, r.fps);
-}
 
 class CameraTest : public EngineCase {
 protected:
     // The dispatcher's choice, which every stream of the call follows.
     static int streamConfig() { return dispatcher().cameraConfig(); }
+    Strings orientCalls(int device, int screen, int autoRotate) {
+        return callsOf([&] { orient(device, screen, autoRotate); });
+    }
 };
 
 }  // namespace
 
-TEST_F(CameraTest, FirstOpenWithoutQosTakesVga30AndTheCameraAngle) {
+TEST_F(CameraTest, FirstOpenWithoutQosTakesVga30AndTheCameraAngleAndClosingUndoesIt) {
     EXPECT_EQ(0, setCamera(0));
-    EXPECT_EQ((Strings{opened(0, kFirstHandle, kVga30), "camdrvOrientAngle(0) = 0"}), newCalls());
+    EXPECT_EQ((Strings{openText(0, kFirstHandle, 480, 640, 30), "camdrvOrientAngle(0) = 0"}), newCalls());
     EXPECT_EQ((Strings{"setCameraId 0, open camera", "startCapture, id: 0",
                        "getCameraSizeFromQos, no QOS seted", "startCapture, id: 0, camera size: 2"}),
               engineLines());
-    EXPECT_EQ(std::vector<int>{kFirstHandle}, hostfakes::openCameras());
     EXPECT_EQ(2, streamConfig());
     EXPECT_STREQ(kBack, dispatcher().captureId());
 
-    // Camera 1 is the front one; every other id is opened as the back camera.
-    EXPECT_EQ(0, setCamera(-1));
+    // Closing stops the capture and removes its preview, once.
     markCalls();
-    EXPECT_EQ(0, setCamera(1));
-    EXPECT_EQ((Strings{opened(1, kFirstHandle + 1, kVga30), "camdrvOrientAngle(0) = 0"}), newCalls());
+    EXPECT_EQ(0, setCamera(-1));
+    EXPECT_EQ((Strings{"setCameraId -1, close camera", "removeRender", "stopCapture"}),
+              engineLinesSince(4));  // after the open's four
+    settleRemovals();
+    // No preview render was added, yet the removal for the camera's name runs.
+    Strings calls = newCalls();
+    std::sort(calls.begin(), calls.end());
+    EXPECT_EQ((Strings{"camdrvStop(256) = 0", removeText(kBack)}), calls);
+    EXPECT_TRUE(callsOf([&] { EXPECT_EQ(0, setCamera(-1)); }).empty());
+    EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender"));
+
+    // Camera 1 is the front one; every other id is opened as the back camera.
+    EXPECT_EQ((Strings{openText(1, kFirstHandle + 1, 480, 640, 30), "camdrvOrientAngle(0) = 0"}),
+              callsOf([&] { EXPECT_EQ(0, setCamera(1)); }));
     EXPECT_STREQ(kFront, dispatcher().captureId());
     EXPECT_EQ(0, setCamera(-1));
-    markCalls();
-    EXPECT_EQ(0, setCamera(5));
-    EXPECT_EQ(opened(5, kFirstHandle + 2, kVga30), newCalls().at(0));
+    EXPECT_EQ(openText(5, kFirstHandle + 2, 480, 640, 30),
+              callsOf([&] { EXPECT_EQ(0, setCamera(5)); }).at(0));
     // The size chosen at the first open holds until the next init.
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag, "getCameraSizeFromQos, no QOS seted"));
 }
@@ -61,23 +58,23 @@ TEST_F(CameraTest, UplinkRateChoosesTheSizeOfTheNextOpen) {
     EXPECT_EQ((Strings{"setUplinkQos, ignore 0", "setUplinkQos, 500 kbitps", "setUplinkQos, ignore 500"}),
               engineLines());
 
+    // Each side of the two thresholds, and a rate below zero.
     const struct {
-        int kbps;
-        int size;
-        Resolution resolution;
-    } cases[] = {{500, 1, kVga15}, {900, 2, kVga30}, {479, 3, kQvga15}, {896, 2, kVga30},
-                 {895, 1, kVga15}, {480, 1, kVga15}, {-2, 3, kQvga15}};
+        int kbps, size, width, height, fps;
+    } cases[] = {{479, 3, 240, 320, 15},
+                 {480, 1, 480, 640, 15},
+                 {895, 1, 480, 640, 15},
+                 {896, 2, 480, 640, 30},
+                 {-2, 3, 240, 320, 15}};
     int handle = kFirstHandle;
     for (const auto& c : cases) {
         SCOPED_TRACE(c.kbps);
         send(kEngineInit, {0});
         send(kUplinkQos, {c.kbps});
-        markCalls();
-        EXPECT_EQ(0, setCamera(1));
-        EXPECT_EQ(opened(1, handle++, c.resolution), newCalls().at(0));
+        EXPECT_EQ(openText(1, handle++, c.width, c.height, c.fps),
+                  callsOf([&] { EXPECT_EQ(0, setCamera(1)); }).at(0));
         EXPECT_TRUE(logged("getCameraSizeFromQos, QOS:" + std::to_string(c.kbps * 1000) +
                            ", camerasize:" + std::to_string(c.size)));
-        EXPECT_TRUE(logged("startCapture, id: 1, camera size: " + std::to_string(c.size)));
         EXPECT_EQ(c.size, streamConfig());
         EXPECT_EQ(0, setCamera(-1));
     }
@@ -86,16 +83,11 @@ TEST_F(CameraTest, UplinkRateChoosesTheSizeOfTheNextOpen) {
     send(kEngineInit, {0});
     send(kUplinkQos, {500});
     EXPECT_EQ(0, setCamera(0));
-    markCalls();
-    send(kUplinkQos, {900});
-    EXPECT_TRUE(logged("setUplinkQos, 900 kbitps"));
-    EXPECT_TRUE(newCalls().empty());
+    EXPECT_TRUE(callsOf([&] { send(kUplinkQos, {900}); }).empty());
     EXPECT_EQ(1, streamConfig());
-    EXPECT_EQ(0, setCamera(-1));
 
     // The building block only answers; the callers store its choice.
     send(kEngineInit, {0});
-    EXPECT_EQ(2, engine()->getCameraSizeFromQos());
     send(kUplinkQos, {479});
     EXPECT_EQ(3, engine()->getCameraSizeFromQos());
     EXPECT_EQ(-1, engine()->mCameraSize);
@@ -120,29 +112,20 @@ TEST_F(CameraTest, PreviewSizeIsFoldedToPortraitAndStoredWhileClosed) {
 
     // The stored size is the one the camera opens with; the rate is not asked.
     EXPECT_EQ(0, setCamera(0));
-    EXPECT_EQ(opened(0, kFirstHandle, kQcif30), newCalls().at(0));
+    EXPECT_EQ(openText(0, kFirstHandle, 176, 144, 30), newCalls().at(0));
     EXPECT_FALSE(logged("getCameraSizeFromQos, no QOS seted"));
     EXPECT_EQ(6, streamConfig());
 }
 
 TEST_F(CameraTest, SizeChangeResizesTheOpenCapture) {
     EXPECT_EQ(0, setCamera(1));
-    markCalls();
-    setSize(3);
-    EXPECT_EQ((Strings{"camdrvResize(256, 240, 320, 15) = 0"}), newCalls());
+    EXPECT_EQ((Strings{"camdrvResize(256, 240, 320, 15) = 0"}), callsOf([&] { setSize(3); }));
     EXPECT_TRUE(
             inOrder(engineLines(), {"setCameraPreviewSize, update 2 -> 3", "restartCapture, new_size:3"}));
     EXPECT_EQ(3, streamConfig());
-
     // 9 folds to 3, the size already in use: nothing happens.
-    markCalls();
-    setSize(9);
-    EXPECT_TRUE(newCalls().empty());
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag, "restartCapture, new_size:3"));
-
-    markCalls();
-    setSize(2);
-    EXPECT_EQ((Strings{"camdrvResize(256, 480, 640, 30) = 0"}), newCalls());
+    EXPECT_TRUE(callsOf([&] { setSize(9); }).empty());
+    EXPECT_EQ((Strings{"camdrvResize(256, 480, 640, 30) = 0"}), callsOf([&] { setSize(2); }));
     EXPECT_EQ(2, streamConfig());
 }
 
@@ -155,7 +138,7 @@ TEST_F(CameraTest, RestartCaptureBuildingBlock) {
                        "restartCapture, should never be here"}),
               engineLines());
     EXPECT_EQ(0, setCamera(0));
-    EXPECT_EQ(opened(0, kFirstHandle, kQvga15), newCalls().at(0));
+    EXPECT_EQ(openText(0, kFirstHandle, 240, 320, 15), newCalls().at(0));
     EXPECT_EQ(0, setCamera(-1));
 
     // A capture started without a handle kept for it is started anew.
@@ -166,33 +149,11 @@ TEST_F(CameraTest, RestartCaptureBuildingBlock) {
     EXPECT_EQ(0, engine()->restartCapture(0, 1));
     EXPECT_TRUE(logged("restartCapture, try start capture"));
     EXPECT_EQ(kFirstHandle + 2, engine()->mCaptureHandle);
-    EXPECT_EQ(opened(1, kFirstHandle + 2, kVga15), newCallsOf("camdrvOpen").at(1));
+    EXPECT_EQ(openText(1, kFirstHandle + 2, 480, 640, 15), newCallsOf("camdrvOpen").at(1));
     EXPECT_EQ(0, setCamera(-1));
     EXPECT_TRUE(called("camdrvStop(258) = 0"));
     EXPECT_EQ(0, engine()->stopCapture(first));
     EXPECT_TRUE(called("camdrvStop(257) = 0"));
-    EXPECT_TRUE(hostfakes::openCameras().empty());
-}
-
-TEST_F(CameraTest, ClosingStopsTheCaptureAndRemovesItsPreviewOnce) {
-    EXPECT_EQ(0, setCamera(0));
-    markCalls();
-    const size_t lines = engineLines().size();
-    EXPECT_EQ(0, setCamera(-1));
-    EXPECT_EQ((Strings{"setCameraId -1, close camera", "removeRender", "stopCapture"}),
-              engineLinesSince(lines));
-    settleRemovals();
-    // No preview render was added, yet the removal for the camera's name runs.
-    Strings calls = newCalls();
-    std::sort(calls.begin(), calls.end());
-    EXPECT_EQ((Strings{"camdrvStop(256) = 0", removeText(kBack)}), calls);
-    EXPECT_TRUE(hostfakes::openCameras().empty());
-
-    markCalls();
-    EXPECT_EQ(0, setCamera(-1));
-    EXPECT_TRUE(logged("setCameraId -1, camera is closed"));
-    EXPECT_TRUE(newCalls().empty());
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender"));
 }
 
 TEST_F(CameraTest, FailedOpenAnswersMinusOneAndLeavesTheCameraClosed) {
@@ -200,7 +161,7 @@ TEST_F(CameraTest, FailedOpenAnswersMinusOneAndLeavesTheCameraClosed) {
     failCalls("camdrvOpen", 0);
     EXPECT_EQ(-1, setCamera(0));
     EXPECT_TRUE(logged("setCameraId, startCapture failed"));
-    EXPECT_EQ((Strings{opened(0, 0, kVga30)}), newCalls());
+    EXPECT_EQ((Strings{openText(0, 0, 480, 640, 30)}), newCalls());
     EXPECT_EQ(capture, dispatcher().captureId());
 
     markCalls();
@@ -211,7 +172,7 @@ TEST_F(CameraTest, FailedOpenAnswersMinusOneAndLeavesTheCameraClosed) {
 
     hostfakes::clearResult("camdrvOpen");
     EXPECT_EQ(0, setCamera(0));
-    EXPECT_TRUE(called(opened(0, kFirstHandle, kVga30)));
+    EXPECT_TRUE(called(openText(0, kFirstHandle, 480, 640, 30)));
     EXPECT_TRUE(called("camdrvOrientAngle(270) = 0"));
 }
 
@@ -221,44 +182,29 @@ TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
     setSurface(kRemoteView);
 
     // Without auto-rotate the screen counts as upright.
-    markCalls();
-    orient(90, 1, 0);
+    EXPECT_EQ((Strings{"camdrvOrientAngle(270) = 0", rotateText(kBack, 270), rotateText(kRemote, 270)}),
+              orientCalls(90, 1, 0));
     EXPECT_EQ((Strings{"setDisplayOrientation, device: 0 -> 90, screen: 0 -> 1, auto_rotate: 1 -> 0",
                        "setDisplayOrientation, enforce screen orientation to be 0"}),
               engineLinesSince(engineLines().size() - 2));
-    EXPECT_EQ((Strings{"camdrvOrientAngle(270) = 0", rotateText(kBack, 270), rotateText(kRemote, 270)}),
-              newCalls());
-
     // Auto-rotate back on: the remote rotation is worked out again, here 0.
-    markCalls();
-    orient(0, 0, 1);
     EXPECT_EQ((Strings{"camdrvOrientAngle(0) = 0", rotateText(kBack, 0), rotateText(kRemote, 0)}),
-              newCalls());
-
+              orientCalls(0, 0, 1));
     // With auto-rotate staying on, an upright remote render stays upright
     // while the preview turns: (720 - 90 - 270) mod 360 = 0.
-    markCalls();
-    orient(90, 3, 1);
+    EXPECT_EQ((Strings{"camdrvOrientAngle(270) = 0", rotateText(kBack, 0)}), orientCalls(90, 3, 1));
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag,
                             "setDisplayOrientation, enforce screen orientation to be 0"));
-    EXPECT_EQ((Strings{"camdrvOrientAngle(270) = 0", rotateText(kBack, 0)}), newCalls());
-    markCalls();
-    orient(0, 1, 1);
-    EXPECT_EQ((Strings{"camdrvOrientAngle(0) = 0", rotateText(kBack, 270)}), newCalls());
+    EXPECT_EQ((Strings{"camdrvOrientAngle(0) = 0", rotateText(kBack, 270)}), orientCalls(0, 1, 1));
 
     // A closed camera and no preview: only the remote render follows.
     EXPECT_EQ(0, setCamera(-1));
-    markCalls();
-    orient(180, 0, 0);
-    EXPECT_EQ((Strings{rotateText(kRemote, 180)}), newCalls());
+    EXPECT_EQ((Strings{rotateText(kRemote, 180)}), orientCalls(180, 0, 0));
     // Switching auto-rotate on works the remote rotation out again even when
     // the remote view is upright.
     orient(0, 0, 0);
-    markCalls();
-    orient(90, 0, 1);
-    EXPECT_EQ((Strings{rotateText(kRemote, 270)}), newCalls());
+    EXPECT_EQ((Strings{rotateText(kRemote, 270)}), orientCalls(90, 0, 1));
     // The device angle set while closed is the capture's at the next open.
-    markCalls();
     EXPECT_EQ(0, setCamera(1));
     EXPECT_TRUE(called("camdrvOrientAngle(270) = 0"));
 }
@@ -266,19 +212,16 @@ TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
 TEST_F(CameraTest, SwitchingCamerasClosesTheOpenOneFirst) {
     EXPECT_EQ(0, setCamera(1));
     setSurface(kLocalView);
-    ASSERT_EQ((std::vector<std::string>{kFront}), hostfakes::activeRenders());
     markCalls();
     const size_t lines = engineLines().size();
     EXPECT_EQ(0, setCamera(0));
     settleRemovals();
-
     EXPECT_TRUE(
-            inOrder(newCalls(), {"camdrvStop(256) = 0", opened(0, kFirstHandle + 1, kVga30),
+            inOrder(newCalls(), {"camdrvStop(256) = 0", openText(0, kFirstHandle + 1, 480, 640, 30),
                                  "camdrvOrientAngle(0) = 0", renderAddText(kBack), rotateText(kBack, 0)}));
     EXPECT_TRUE(called(removeText(kFront)));
-    EXPECT_EQ(std::vector<int>{kFirstHandle + 1}, hostfakes::openCameras());
     // The stored preview surface follows the switch under the new camera's name.
-    EXPECT_EQ((std::vector<std::string>{kBack}), hostfakes::activeRenders());
+    EXPECT_EQ((Strings{kBack}), hostfakes::activeRenders());
     EXPECT_TRUE(inOrder(engineLinesSince(lines),
                         {"setCameraId -1, close camera", "removeRender", "stopCapture",
                          "setCameraId 0, open camera", "setCameraId, id: 0, start local render"}));
@@ -287,15 +230,11 @@ TEST_F(CameraTest, SwitchingCamerasClosesTheOpenOneFirst) {
 
 TEST_F(CameraTest, OpeningWithAStoredPreviewSurfaceShowsThePreview) {
     setSurface(kLocalView);
-    EXPECT_TRUE(logged("setPreviewSurface add Render, camera is not opened"));
     EXPECT_TRUE(newCalls().empty());
-
     orient(0, 1, 1);
-    markCalls();
-    EXPECT_EQ(0, setCamera(1));
-    EXPECT_EQ((Strings{opened(1, kFirstHandle, kVga30), "camdrvOrientAngle(0) = 0", renderAddText(kFront),
-                       rotateText(kFront, 270)}),
-              newCalls());
+    EXPECT_EQ((Strings{openText(1, kFirstHandle, 480, 640, 30), "camdrvOrientAngle(0) = 0",
+                       renderAddText(kFront), rotateText(kFront, 270)}),
+              callsOf([&] { EXPECT_EQ(0, setCamera(1)); }));
     EXPECT_TRUE(logged("setCameraId, id: 1, start local render"));
     EXPECT_EQ(1u, android::Surface::liveCount());
     setSurface(kLocalView);
@@ -307,7 +246,6 @@ TEST_F(CameraTest, OpeningWithAStoredPreviewSurfaceShowsThePreview) {
     EXPECT_EQ(0, setCamera(0));
     EXPECT_TRUE(logged("setCameraId, addRender failed", ANDROID_LOG_ERROR));
     hostfakes::clearResult("renderAdd");
-    markCalls();
-    setSurface(kLocalView);
-    EXPECT_EQ((Strings{renderAddText(kBack), rotateText(kBack, 270)}), newCalls());
+    EXPECT_EQ((Strings{renderAddText(kBack), rotateText(kBack, 270)}),
+              callsOf([&] { setSurface(kLocalView); }));
 }

@@ -1,7 +1,8 @@
-// What the camera, render, listener, loopback and call suites share: a
-// fixture that drives the engine through the registered service as the IMS
-// client does, reads the platform call record from a mark, waits for the
-// engine's detached render removals, and plays the modem on the engine's pipe.
+// What the engine suites share: a fixture that drives the engine through the
+// registered service as the IMS client does, reads the platform call record
+// from a mark, waits for the engine's detached render removals, and plays the
+// modem on the engine's pipe; and, for the service and callback suites, a
+// fixture that sees the engine start in a fresh process.
 #ifndef QUELLBORN_TESTS_ENGINE_ENGINETESTUTIL_H
 #define QUELLBORN_TESTS_ENGINE_ENGINETESTUTIL_H
 
@@ -20,12 +21,16 @@
 #include "EngineHarness.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
+#include "MmeEventObserver.h"
 #include "VideoCallEngineImpl.h"
 #include "VtspManager.h"
 #include "VtspRecord.h"
 
 namespace enginecase {
 
+using Strings = std::vector<std::string>;
+
+inline constexpr const char* kServiceTag = "VideoCallEngineService";
 inline constexpr const char* kEngineTag = "VideoCallEngineImpl";
 inline constexpr const char* kZmfTag = "VideoCallEngineZmf";
 inline constexpr const char* kFront = "Camera 1, Facing front, Orientation 270";
@@ -34,18 +39,9 @@ inline constexpr const char* kRemote = "Remote";
 inline constexpr int kFirstHandle = 0x100;
 
 // Transaction codes of the service, as the client sends them.
-enum Code : uint32_t {
-    kSetSurface = 1,
-    kSetCallback = 2,
-    kEngineInit = 4,
-    kCleanSurface = 7,
-    kRelease = 8,
-    kCameraId = 9,
-    kCameraSize = 10,
-    kOrientation = 11,
-    kHideImage = 16,
-    kUplinkQos = 17,
-};
+inline constexpr uint32_t kInit = 0, kSetSurface = 1, kSetCallback = 2, kCleanCallback = 3, kEngineInit = 4,
+                          kCleanSurface = 7, kRelease = 8, kCameraId = 9, kCameraSize = 10, kOrientation = 11,
+                          kHideImage = 16, kUplinkQos = 17;
 enum Target : int32_t { kRemoteView = 0, kLocalView = 1 };
 
 inline std::string quoted(const std::string& text) { return "\"" + text + "\""; }
@@ -58,6 +54,18 @@ bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seco
         std::this_thread::sleep_for(std::chrono::milliseconds(2));
     }
     return true;
+}
+
+inline Strings plus(Strings calls, const Strings& more) {
+    calls.insert(calls.end(), more.begin(), more.end());
+    return calls;
+}
+
+// An event on the media engine's event path.
+inline void mmeEvent(int event) {
+    android::MmeEventObserver* observer = android::m_pMmeEventObserver.load();
+    ASSERT_NE(nullptr, observer) << "no media engine observer";
+    observer->mmeEvtUpdate(event);
 }
 
 inline bool contains(const std::vector<std::string>& all, const std::string& one) {
@@ -81,10 +89,23 @@ inline ::testing::AssertionResult inOrder(const std::vector<std::string>& all,
     return ::testing::AssertionSuccess();
 }
 
-// The int32 words of a request the client's callback received.
-inline std::vector<int32_t> words(const hostbinder::RemoteBinder::Transaction& t) {
-    std::vector<int32_t> out(t.data.size() / sizeof(int32_t));
-    if (!out.empty()) memcpy(out.data(), t.data.data(), out.size() * sizeof(int32_t));
+// One transaction as "code <c> flags <f>: <int32> <int32> ...", so the byte
+// count (no interface token in front) and the values are checked in one go.
+inline std::string describe(uint32_t code, const uint8_t* bytes, size_t size, uint32_t flags) {
+    std::string out = "code " + std::to_string(code) + " flags " + std::to_string(flags) + ":";
+    for (size_t at = 0; at + sizeof(int32_t) <= size; at += sizeof(int32_t)) {
+        int32_t v;
+        memcpy(&v, bytes + at, sizeof(v));
+        out += " " + std::to_string(v);
+    }
+    if (size % sizeof(int32_t) != 0) out += " +" + std::to_string(size % sizeof(int32_t)) + " bytes";
+    return out;
+}
+// What the client's callback received, one transaction a line.
+inline Strings received(const hostbinder::RemoteBinder& client) {
+    Strings out;
+    for (const auto& t : client.transactions())
+        out.push_back(describe(t.code, t.data.data(), t.data.size(), t.flags));
     return out;
 }
 
@@ -159,6 +180,13 @@ protected:
         return out;
     }
     bool called(const std::string& text) const { return contains(newCalls(), text); }
+    // The calls one step makes.
+    template <typename Step>
+    std::vector<std::string> callsOf(Step step) {
+        markCalls();
+        step();
+        return newCalls();
+    }
 
     // The engine's own info lines, in order.
     std::vector<std::string> engineLines() const {
@@ -202,13 +230,9 @@ protected:
         start.localAddr = vtspcodec::address("10.0.0.1", 6000);
         start.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
         enginetest::modem().writeRecord(vtspcodec::streamRecord(start));
-        android::VPR_Comm record{};
+        android::VPR_Comm record{};  // the bind request's fields are the link's tests' concern
         ASSERT_TRUE(enginetest::modem().readRecord(&record)) << "no bind request";
-        const vtspcodec::BindRequest bind = vtspcodec::readBindRequest(record);
-        EXPECT_EQ(android::VPR_NET_CMD_BIND, bind.code);
-        EXPECT_EQ(static_cast<int32_t>(streamId), bind.streamId);
-        EXPECT_EQ("10.0.0.1", vtspcodec::addressText(bind.addr));
-        EXPECT_EQ(6000, bind.addr.port);
+        EXPECT_EQ(android::VPR_NET_CMD_BIND, vtspcodec::readBindRequest(record).code);
     }
     // Ends it; the engine stream `mvdStream` is then closed.
     void endStream(uint32_t streamId, unsigned int mvdStream) {
@@ -249,6 +273,43 @@ inline std::string rotateText(const char* id, int angle) {
     return "renderRotate(" + quoted(id) + ", " + std::to_string(angle) + ") = 0";
 }
 inline std::string removeText(const char* id) { return "renderRemove(" + quoted(id) + ") = 0"; }
+
+// The service and callback suites: each case (a process of its own) resets
+// the call record before its first lookup registers the service, so it sees
+// the engine's start-up.
+class FreshServiceCase : public ::testing::Test {
+protected:
+    FreshServiceCase() {
+        hostfakes::reset();
+        service = enginetest::service();
+    }
+    // Lines of `tag`, each as "<I|E> <text>".
+    Strings linesOf(const char* tag) const {
+        Strings out;
+        for (const LogLine& l : log.linesWithTag(tag)) {
+            out.push_back((l.priority == ANDROID_LOG_INFO    ? "I "
+                           : l.priority == ANDROID_LOG_ERROR ? "E "
+                                                             : "? ") +
+                          l.text);
+        }
+        return out;
+    }
+    size_t count(const char* tag, const std::string& text) const {
+        return log.count(ANDROID_LOG_INFO, tag, text);
+    }
+    // Starts a fresh view of the log and of the platform calls.
+    void mark() {
+        log.clear();
+        mStart = hostfakes::callCount();
+    }
+    Strings calls() const { return hostfakes::callTextsSince(mStart); }
+
+    LogCapture log;
+    android::sp<android::IBinder> service;
+
+private:
+    size_t mStart = 0;
+};
 
 }  // namespace enginecase
 

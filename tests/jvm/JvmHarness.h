@@ -7,6 +7,7 @@
 #ifndef QUELLBORN_TESTS_JVMHARNESS_H
 #define QUELLBORN_TESTS_JVMHARNESS_H
 
+#include <android/log.h>
 #include <binder/IBinder.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
@@ -15,17 +16,27 @@
 
 #include <chrono>
 #include <initializer_list>
+#include <memory>
 #include <optional>
 #include <string>
 #include <thread>
+#include <type_traits>
 #include <utility>
 #include <vector>
 
+#include "HostFakes.h"
 #include "LogCapture.h"
 #include "Mvd.h"
 #include "RemoteBinder.h"
 
 namespace jvmtest {
+
+// Texts in order (calls, log lines, upcalls), and two such lists joined.
+using V = std::vector<std::string>;
+inline V operator+(V a, const V& b) {
+    a.insert(a.end(), b.begin(), b.end());
+    return a;
+}
 
 constexpr const char* kMme = "com/tessaroval/vce/Mme";
 constexpr const char* kVceService = "com/tessaroval/vce/VceService";
@@ -33,86 +44,72 @@ constexpr const char* kUpcallLog = "com/tessaroval/vce/UpcallLog";
 
 // Picks the classpath of this process's JVM; only before the first jvm().
 void useClassPath(const std::string& classPath);
-bool vmCreated();
-
 JavaVM* jvm();
 // The environment of the calling thread (the thread must be attached).
 JNIEnv* env();
 
 // System.loadLibrary("quellborn"); returns the pending exception's class
-// name ("" when it loaded) and clears it.
+// name ("" when it loaded) and clears it. lastMessage() is its message.
 std::string loadLibrary();
-// loadLibrary() once per process; later calls answer the first result.
-std::string ensureLoaded();
-
-// The message of the last exception takeException cleared.
 std::string& lastMessage();
-
-// Clears a pending exception and returns its class name ("" when none).
-std::string takeException(JNIEnv* env);
 
 // A local reference the caller owns; null (exception cleared) when missing.
 jclass findClass(const char* name);
 
 // Owns one local reference of the calling thread.
+struct LocalDelete {
+    void operator()(jobject ref) const { env()->DeleteLocalRef(ref); }
+};
 template <typename T>
-class Local {
-public:
-    explicit Local(T ref = nullptr, JNIEnv* e = nullptr) : mRef(ref), mEnv(e != nullptr ? e : env()) {}
-    ~Local() {
-        if (mRef != nullptr) mEnv->DeleteLocalRef(mRef);
-    }
-    Local(Local&& other) noexcept : mRef(std::exchange(other.mRef, nullptr)), mEnv(other.mEnv) {}
-    Local(const Local&) = delete;
-    Local& operator=(const Local&) = delete;
-    Local& operator=(Local&&) = delete;
-    T get() const { return mRef; }
-    operator T() const { return mRef; }
-
-private:
-    T mRef;
-    JNIEnv* mEnv;
+struct Local : std::unique_ptr<std::remove_pointer_t<T>, LocalDelete> {
+    using std::unique_ptr<std::remove_pointer_t<T>, LocalDelete>::unique_ptr;
+    operator T() const { return this->get(); }
 };
 
 inline jvalue I(jint v) { jvalue j; j.i = v; return j; }
 inline jvalue J(jlong v) { jvalue j; j.j = v; return j; }
 inline jvalue L(jobject v) { jvalue j; j.l = v; return j; }
 
-// Static calls by class, name and exact signature. An exception the call
-// leaves pending is cleared and its class name stored in *thrown; without a
-// place for it, the exception fails the case.
-jint callInt(const char* cls, const char* name, const char* sig, std::vector<jvalue> args = {},
-             std::string* thrown = nullptr);
-jboolean callBool(const char* cls, const char* name, const char* sig, std::vector<jvalue> args = {});
-// The returned string as UTF-16, nullopt when Java got null.
-std::optional<std::u16string> callString(const char* cls, const char* name, const char* sig,
-                                         std::vector<jvalue> args = {});
-void callVoid(const char* cls, const char* name, const char* sig, std::vector<jvalue> args = {});
-
+// A static call by class, name and exact signature; the answer is in the
+// member the signature's return type names (a returned object is a local
+// reference the caller owns). An exception the call leaves pending is
+// cleared and its class name stored in *thrown; without a place for it, the
+// exception fails the case.
+jvalue callStatic(const char* cls, const char* name, const char* sig, std::vector<jvalue> args = {},
+                  std::string* thrown = nullptr);
 inline jint mme(const char* name, const char* sig, std::vector<jvalue> args = {},
                 std::string* thrown = nullptr) {
-    return callInt(kMme, name, sig, std::move(args), thrown);
+    return callStatic(kMme, name, sig, std::move(args), thrown).i;
 }
+// An Mme native answering a String, as UTF-16; nullopt when Java got null.
+std::optional<std::u16string> mmeString(const char* name, const char* sig, std::vector<jvalue> args = {});
 
 Local<jstring> newString(const std::u16string& text);
-std::u16string chars(jstring text);
-std::string toString(JNIEnv* env, jstring text);
-// A new android.content.Context.
-Local<jobject> newContext(const char* name);
+// new <cls>(args) by the constructor's exact signature.
+Local<jobject> newObject(const char* cls, const char* ctorSig, std::vector<jvalue> args = {});
 Local<jlongArray> newLongArray(jsize length, jlong fill);
 std::vector<jlong> elements(jlongArray array);
+// Mme.captureStatistics (which must answer 0) into a new array of 16.
+std::vector<jlong> captureStatistics(jlong stream);
 
 // What the Java side recorded (UpcallLog: "name(args) on <thread>"), the
 // thread named in one entry, and the switches of the stand-ins.
-std::vector<std::string> upcalls();
-void clearUpcalls();
-std::string threadOf(const std::string& upcall);
+V upcalls();
+inline void clearUpcalls() { callStatic(kUpcallLog, "clear", "()V"); }
+inline std::string threadOf(const std::string& upcall) { return upcall.substr(upcall.rfind(" on ") + 4); }
 // Matches the entry of `call` ("zpandTimerStart(5000)") made on a thread
-// the upcall attached for itself, which the JVM names "Thread-<n>".
+// the upcall attached for itself (the JVM names it "Thread-<n>") and has
+// detached again (no live Java thread has its name).
 ::testing::Matcher<std::string> onAttachedThread(const std::string& call);
-void setUpcallResult(jint value);
-void setUpcallThrowing(bool throwing);
-void setScreenOrientation(jint value);
+inline void setUpcallResult(jint value) { callStatic(kUpcallLog, "setResult", "(I)V", {I(value)}); }
+inline void setUpcallThrowing(bool throwing) {
+    jvalue v;
+    v.z = throwing ? JNI_TRUE : JNI_FALSE;
+    callStatic(kUpcallLog, "setThrowing", "(Z)V", {v});
+}
+inline void setScreenOrientation(jint value) {
+    callStatic(kVceService, "setScreenOrientation", "(I)V", {I(value)});
+}
 // Whether a live Java thread carries this name.
 bool javaThreadAlive(const std::string& name);
 
@@ -121,7 +118,7 @@ bool javaThreadAlive(const std::string& name);
 tagMVD_EVNT mvdEvent(int number);
 
 // The bridge's info lines (tag "Mme_JNI"), in order.
-std::vector<std::string> bridgeLines(const LogCapture& log);
+V bridgeLines(const LogCapture& log);
 
 // new VceService().init(), with the modem pipe put in place first.
 jint vceServiceInit();
@@ -134,7 +131,7 @@ int32_t sendToService(uint32_t code, std::initializer_list<int32_t> ints = {},
                       const android::sp<android::IBinder>& binder = nullptr);
 
 // What a client's binder received, one "code <c>: <int32> <int32> ..." each.
-std::vector<std::string> received(const hostbinder::RemoteBinder& client);
+V received(const hostbinder::RemoteBinder& client);
 
 // Runs fn on a new native thread, which no JVM knows, and returns its result.
 template <typename Fn>
@@ -144,21 +141,6 @@ auto onNativeThread(Fn fn) -> decltype(fn()) {
     t.join();
     return result;
 }
-
-// A virtual machine whose every function only counts the call and fails:
-// code given it shows whether it touched the VM at all.
-class UntouchableVm {
-public:
-    UntouchableVm();
-    JavaVM* get() { return &mVm; }
-    static int touches();
-
-private:
-    JavaVM mVm;
-};
-
-// Lines the JVM printed that report a JNI misuse (-Xcheck:jni warnings).
-std::vector<std::string> jniWarnings();
 
 template <typename Pred>
 bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seconds(5)) {
@@ -184,9 +166,20 @@ protected:
     static void load();
 
     LogCapture log;
+};
 
-private:
-    size_t mWarningMark = 0;
+// A JvmCase that loads the library first.
+class LoadedCase : public JvmCase {
+protected:
+    void SetUp() override {
+        JvmCase::SetUp();
+        load();
+    }
+    // sysInit installs the bridge; the log starts after it.
+    void startBridge() {
+        ASSERT_EQ(0, mme("sysInit", "()I"));
+        log.clear();
+    }
 };
 
 }  // namespace jvmtest

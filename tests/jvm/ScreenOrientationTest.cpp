@@ -1,14 +1,6 @@
 // getScreenOrientation, the upcall other native components of the process
 // make: which threads it attaches and detaches, what it answers, and what
-// happens when the Java side throws or is missing.
-#include <android/log.h>
-#include <gmock/gmock.h>
-#include <gtest/gtest.h>
-
-#include <string>
-#include <thread>
-#include <vector>
-
+// happens when the Java side throws. (Without a bound class: LoadHookTest.)
 #include "JvmHarness.h"
 #include "VceServiceJni.h"
 
@@ -16,7 +8,6 @@ using namespace jvmtest;
 
 namespace {
 
-constexpr const char* kJniTag = "VCEService-JNI";
 constexpr const char* kCleared = "getScreenOrientation: Java exception cleared";
 
 jint envState() {
@@ -24,114 +15,59 @@ jint envState() {
     return jvm()->GetEnv(&e, JNI_VERSION_1_4);
 }
 
-struct NativeCall {
-    int orientation = 0;
-    jint envAfter = JNI_OK;
-};
-
-// One upcall from a plain native thread, and whether the thread is still
-// known to the JVM afterwards.
-NativeCall fromNativeThread() {
-    return onNativeThread([] { return NativeCall{getScreenOrientation(), envState()}; });
+// Upcalls on one plain native thread: each answer, with whether the thread
+// was still known to the JVM after it.
+std::vector<std::pair<int, jint>> fromNativeThread(size_t calls) {
+    return onNativeThread([calls] {
+        std::vector<std::pair<int, jint>> out;
+        while (out.size() < calls) out.emplace_back(getScreenOrientation(), envState());
+        return out;
+    });
 }
 
-class ScreenOrientationTest : public JvmCase {
-protected:
-    void SetUp() override {
-        JvmCase::SetUp();
-        load();
-    }
-};
+using ScreenOrientationTest = LoadedCase;
 
 }  // namespace
 
-TEST_F(ScreenOrientationTest, AJavaThreadIsNeitherAttachedNorDetached) {
+TEST_F(ScreenOrientationTest, AThreadTheJvmKnowsIsNeitherAttachedNorDetached) {
     setScreenOrientation(270);
     EXPECT_EQ(270, getScreenOrientation());
-    EXPECT_EQ(std::vector<std::string>{"getScreenOrientation() on main"}, upcalls());
     EXPECT_EQ(JNI_OK, envState());
-    EXPECT_FALSE(env()->ExceptionCheck());
-}
-
-TEST_F(ScreenOrientationTest, AThreadAttachedByItsOwnerStaysAttached) {
-    setScreenOrientation(2);
-    struct Seen {
-        int orientation = -1;
-        jint envAfter = JNI_ERR;
-    } seen;
-    std::thread owner([&] {
+    // A thread its owner attached stays attached too.
+    std::pair<int, jint> owner{-1, JNI_ERR};
+    std::thread([&] {
         JavaVMAttachArgs args{JNI_VERSION_1_6, const_cast<char*>("camera-service"), nullptr};
         JNIEnv* e = nullptr;
         if (jvm()->AttachCurrentThread(&e, &args) != JNI_OK) return;
-        seen.orientation = getScreenOrientation();
-        seen.envAfter = envState();
+        owner = {getScreenOrientation(), envState()};
         jvm()->DetachCurrentThread();
-    });
-    owner.join();
-    EXPECT_EQ(2, seen.orientation);
-    EXPECT_EQ(JNI_OK, seen.envAfter);
-    EXPECT_EQ(std::vector<std::string>{"getScreenOrientation() on camera-service"}, upcalls());
+    }).join();
+    EXPECT_EQ(std::make_pair(270, JNI_OK), owner);
+    EXPECT_EQ((V{"getScreenOrientation() on main", "getScreenOrientation() on camera-service"}), upcalls());
 }
 
 TEST_F(ScreenOrientationTest, APlainNativeThreadIsAttachedForEachCallOnly) {
     setScreenOrientation(-1);
-    const NativeCall first = fromNativeThread();
-    EXPECT_EQ(-1, first.orientation);
-    EXPECT_EQ(JNI_EDETACHED, first.envAfter);
-
     // Two calls on one thread: a new attachment (a new Java thread) for each.
-    std::vector<int> answers;
-    std::vector<jint> states;
-    std::thread repeated([&] {
-        for (int i = 0; i < 2; ++i) {
-            answers.push_back(getScreenOrientation());
-            states.push_back(envState());
-        }
-    });
-    repeated.join();
-    EXPECT_EQ((std::vector<int>{-1, -1}), answers);
-    EXPECT_EQ((std::vector<jint>{JNI_EDETACHED, JNI_EDETACHED}), states);
-
-    const std::vector<std::string> calls = upcalls();
-    ASSERT_EQ(3u, calls.size());
-    for (const std::string& call : calls) {
-        EXPECT_THAT(call, onAttachedThread("getScreenOrientation()"));
-        EXPECT_FALSE(javaThreadAlive(threadOf(call))) << call;
-    }
-    EXPECT_NE(threadOf(calls[1]), threadOf(calls[2]));
+    EXPECT_EQ((std::vector<std::pair<int, jint>>{{-1, JNI_EDETACHED}, {-1, JNI_EDETACHED}}),
+              fromNativeThread(2));
+    const V calls = upcalls();
+    ASSERT_EQ(2u, calls.size());
+    EXPECT_THAT(calls, ::testing::Each(onAttachedThread("getScreenOrientation()")));
+    EXPECT_NE(threadOf(calls[0]), threadOf(calls[1]));
+    EXPECT_TRUE(javaThreadAlive("main")) << "the check sees live threads";
 }
 
 TEST_F(ScreenOrientationTest, AJavaExceptionIsClearedAndLogged) {
     setScreenOrientation(3);
     setUpcallThrowing(true);
-    // The answer of a method that threw is the JVM's 0.
+    // The answer of a method that threw is the JVM's 0, on a Java thread and
+    // on a native one.
     EXPECT_EQ(0, getScreenOrientation());
     EXPECT_FALSE(env()->ExceptionCheck()) << "the upcall left its exception on the caller's thread";
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, kJniTag, kCleared));
-
-    const NativeCall native = fromNativeThread();
-    EXPECT_EQ(0, native.orientation);
-    EXPECT_EQ(JNI_EDETACHED, native.envAfter);
-    EXPECT_EQ(2u, log.count(ANDROID_LOG_ERROR, kJniTag, kCleared));
+    EXPECT_EQ((std::vector<std::pair<int, jint>>{{0, JNI_EDETACHED}}), fromNativeThread(1));
+    EXPECT_EQ(2u, log.count(ANDROID_LOG_ERROR, "VCEService-JNI", kCleared));
     EXPECT_EQ(2u, upcalls().size());
-
     setUpcallThrowing(false);
     EXPECT_EQ(3, getScreenOrientation());
-}
-
-TEST_F(ScreenOrientationTest, WithoutTheClassTheAnswerIsZeroAndTheVmIsNotTouched) {
-    // The state a failed load hook leaves behind: no class reference.
-    jclass const bound = clazz;
-    JavaVM* const real = vce_jvm;
-    UntouchableVm untouchable;
-    clazz = nullptr;
-    vce_jvm = untouchable.get();
-    const int onMain = getScreenOrientation();
-    const int onNative = onNativeThread([] { return getScreenOrientation(); });
-    vce_jvm = real;
-    clazz = bound;
-    EXPECT_EQ(0, onMain);
-    EXPECT_EQ(0, onNative);
-    EXPECT_EQ(0, UntouchableVm::touches());
-    EXPECT_TRUE(upcalls().empty());
 }

@@ -5,7 +5,6 @@
 #include <binder/Parcel.h>
 #include <gtest/gtest.h>
 
-#include <atomic>
 #include <vector>
 
 using namespace android;
@@ -49,18 +48,23 @@ TEST(BBinder, DefaultsOfALocalBinder) {
     EXPECT_EQ(INVALID_OPERATION, binder->unlinkToDeath(recipient));
 }
 
-TEST(BBinder, DefaultTransactionsPingDescribeOrRefuse) {
-    sp<IBinder> binder = new BBinder();
+TEST(BBinder, TransactDispatchesFromTheStartOfBothParcelsPingsAndDescribes) {
+    sp<EchoBinder> binder = new EchoBinder();
     Parcel data;
+    data.writeInt32(41);  // leaves the position at 4
+    Parcel echoed;
+    EXPECT_EQ(NO_ERROR, binder->transact(EchoBinder::kEcho, data, &echoed));
+    EXPECT_EQ(0u, binder->positionSeen);
+    EXPECT_EQ(0u, echoed.dataPosition());
+    EXPECT_EQ(42, echoed.readInt32());
+
     Parcel reply;
     EXPECT_EQ(NO_ERROR, binder->transact(IBinder::PING_TRANSACTION, data, &reply));
     EXPECT_EQ(0u, reply.dataSize());
-
     EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, &reply));
-    EXPECT_EQ(0u, reply.dataPosition());
     EXPECT_EQ(String16(), reply.readString16());
-
-    for (uint32_t code : {0u, 5u, 0xffffffffu}) {
+    // Codes no one knows reach the default handling and leave the reply empty.
+    for (uint32_t code : {0u, EchoBinder::kEcho + 1, 0xffffffffu}) {
         Parcel r;
         EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(code, data, &r)) << code;
         EXPECT_EQ(0u, r.dataSize()) << code;
@@ -68,21 +72,6 @@ TEST(BBinder, DefaultTransactionsPingDescribeOrRefuse) {
     // One-way calls have no reply parcel.
     EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(7, data, nullptr, IBinder::FLAG_ONEWAY));
     EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, nullptr));
-}
-
-TEST(BBinder, TransactReadsTheRequestAndTheReplyFromTheStart) {
-    sp<EchoBinder> binder = new EchoBinder();
-    Parcel data;
-    data.writeInt32(41);
-    ASSERT_EQ(4u, data.dataPosition());
-    Parcel reply;
-    EXPECT_EQ(NO_ERROR, binder->transact(EchoBinder::kEcho, data, &reply));
-    EXPECT_EQ(0u, binder->positionSeen);
-    EXPECT_EQ(0u, reply.dataPosition());
-    EXPECT_EQ(42, reply.readInt32());
-
-    // Codes it does not know reach the default handling.
-    EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(EchoBinder::kEcho + 1, data, &reply));
 }
 
 TEST(BBinder, AttachedObjectsAreFoundDetachedAndCleanedUpWithTheBinder) {

@@ -29,29 +29,16 @@ protected:
 
 }  // namespace
 
-TEST(IGraphicBufferProducer, RemoteBinderBecomesAProxyOverThatBinder) {
+TEST(IGraphicBufferProducer, ProxyAndLocalProducerBothCarryTheDescriptor) {
+    const String16 descriptor("android.gui.IGraphicBufferProducer");
     sp<RemoteBinder> remote = new RemoteBinder();
-    sp<IGraphicBufferProducer> producer = IGraphicBufferProducer::asInterface(remote);
-    ASSERT_NE(nullptr, producer);
-    EXPECT_EQ(sp<IBinder>(remote), IInterface::asBinder(producer));
-    EXPECT_EQ(String16("android.gui.IGraphicBufferProducer"), producer->getInterfaceDescriptor());
+    EXPECT_EQ(descriptor, IGraphicBufferProducer::asInterface(remote)->getInterfaceDescriptor());
     EXPECT_EQ(0u, remote->transactionCount());  // wrapping is not a call
-    EXPECT_EQ(nullptr, IGraphicBufferProducer::asInterface(nullptr));
-}
 
-TEST(IGraphicBufferProducer, LocalProducerIsReturnedItself) {
-    sp<BnGraphicBufferProducer> local = new BnGraphicBufferProducer();
-    sp<IBinder> binder = IInterface::asBinder(local);
-    EXPECT_EQ(static_cast<IBinder*>(local.get()), binder.get());
-    sp<IGraphicBufferProducer> same = IGraphicBufferProducer::asInterface(binder);
-    EXPECT_EQ(static_cast<IGraphicBufferProducer*>(local.get()), same.get());
-    EXPECT_EQ(String16("android.gui.IGraphicBufferProducer"), binder->getInterfaceDescriptor());
-
-    Parcel data;
-    Parcel reply;
-    EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, &reply));
-    EXPECT_EQ(String16("android.gui.IGraphicBufferProducer"), reply.readString16());
-
+    sp<IBinder> local = IInterface::asBinder(sp<BnGraphicBufferProducer>(new BnGraphicBufferProducer()));
+    Parcel data, reply;
+    EXPECT_EQ(NO_ERROR, local->transact(IBinder::INTERFACE_TRANSACTION, data, &reply));
+    EXPECT_EQ(descriptor, reply.readString16());
     // A binder of another interface is not taken for a local producer.
     EXPECT_EQ(nullptr, local->queryLocalInterface(String16("android.test.IOther")));
 }
@@ -59,23 +46,18 @@ TEST(IGraphicBufferProducer, LocalProducerIsReturnedItself) {
 TEST(IGraphicBufferProducer, ProducerSentThroughAParcelArrivesAsProxyOrItself) {
     sp<ProducerSink> sink = new ProducerSink();
     sp<RemoteBinder> remote = new RemoteBinder();
-    Parcel data;
-    data.writeStrongBinder(remote);
-    Parcel reply;
-    ASSERT_EQ(NO_ERROR, sink->transact(IBinder::FIRST_CALL_TRANSACTION, data, &reply));
-    EXPECT_EQ(1, reply.readInt32());
-    EXPECT_EQ(sp<IBinder>(remote), IInterface::asBinder(sink->producer));
-
     sp<BnGraphicBufferProducer> local = new BnGraphicBufferProducer();
-    Parcel localData;
-    localData.writeStrongBinder(IInterface::asBinder(local));
-    ASSERT_EQ(NO_ERROR, sink->transact(IBinder::FIRST_CALL_TRANSACTION, localData, &reply));
+    auto send = [&](const sp<IBinder>& binder) {
+        Parcel data, reply;
+        data.writeStrongBinder(binder);
+        EXPECT_EQ(NO_ERROR, sink->transact(IBinder::FIRST_CALL_TRANSACTION, data, &reply));
+        return reply.readInt32();
+    };
+    EXPECT_EQ(1, send(remote));
+    EXPECT_EQ(sp<IBinder>(remote), IInterface::asBinder(sink->producer));  // a proxy over the sender's binder
+    EXPECT_EQ(1, send(IInterface::asBinder(local)));
     EXPECT_EQ(static_cast<IGraphicBufferProducer*>(local.get()), sink->producer.get());
-
-    Parcel nullData;
-    nullData.writeStrongBinder(nullptr);
-    ASSERT_EQ(NO_ERROR, sink->transact(IBinder::FIRST_CALL_TRANSACTION, nullData, &reply));
-    EXPECT_EQ(0, reply.readInt32());
+    EXPECT_EQ(nullptr, IGraphicBufferProducer::asInterface(nullptr));
 }
 
 TEST(Surface, HoldsItsProducerAndIsCountedWhileAlive) {
@@ -96,8 +78,6 @@ TEST(Surface, HoldsItsProducerAndIsCountedWhileAlive) {
 
     sp<Surface> app = new Surface(nullptr, true);
     EXPECT_TRUE(app->isControlledByApp());
-    EXPECT_EQ(nullptr, app->getIGraphicBufferProducer());
-    EXPECT_EQ(before + 2, Surface::liveCount());
 
     surface.clear();
     EXPECT_EQ(before + 1, Surface::liveCount());

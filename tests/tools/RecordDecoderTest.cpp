@@ -90,35 +90,27 @@ TEST(RecordDecoderDescribe, UnknownThingsAreNamedWithAnExcerpt) {
     EXPECT_NE(std::string::npos, described(shifted).find("(not 3664: if the trailer looks like body bytes"));
 }
 
-TEST(RecordDecoderStream, CountsRecordsAndReportsTrailingBytes) {
+TEST(RecordDecoderStream, TrailingBytesAreExplainedAndShown) {
+    // The counts are checked on arbitrary streams below, the exit status by the vtsp CTest entry.
     const VPR_Comm records[] = {recordOf("start stream=1 local=10.0.0.1:6000"), recordOf("end stream=1")};
-    std::string bytes(reinterpret_cast<const char*>(records), sizeof(records));
-    bytes += std::string(10, '\x07');
-    std::istringstream in(bytes);
+    std::istringstream in(std::string(reinterpret_cast<const char*>(records), sizeof(records)) + std::string(10, '\x07'));
     std::ostringstream out;
-    const RecordDecoder::StreamResult result = RecordDecoder::decodeStream(in, out);
-    EXPECT_EQ(2u, result.records);
-    EXPECT_EQ(10u, result.trailingBytes);
-    EXPECT_NE(std::string::npos, out.str().find("record 1  type 0"));
+    RecordDecoder::decodeStream(in, out);
     EXPECT_NE(std::string::npos, out.str().find("trailing 10 bytes after 2 whole records (7338 bytes is not a multiple "
                                                 "of 3664): 07 07 07 07 07 07 07 07 07 07\n"));
 }
 
-TEST(RecordDecoderStream, StepsOutputReadsBackAsTheSameRecords) {
+TEST(RecordDecoderStream, StepsOutputIsOneStepPerRecord) {
+    // That each step builds its record again is checked by StepSyntaxText.
     const VPR_Comm records[] = {recordOf("start stream=1 local=[::1]:6000 remote=10.1.1.1:5000 ext=2"),
                                 recordOf("config stream=1 rtcp=0x10"), recordOf("raw target=8 type=1")};
     std::istringstream in(std::string(reinterpret_cast<const char*>(records), sizeof(records)));
     std::ostringstream out;
     RecordDecoder::decodeStream(in, out, true);
-    std::istringstream steps(out.str());
-    std::vector<StepSyntax::Step> parsed;
-    std::string error;
-    ASSERT_TRUE(StepSyntax::parseLines(steps, &parsed, &error)) << error;
-    ASSERT_EQ(3u, parsed.size());
-    for (size_t i = 0; i < parsed.size(); ++i) {
-        const VPR_Comm again = parsed[i].record();
-        EXPECT_EQ(0, memcmp(&records[i], &again, sizeof(again))) << out.str();
-    }
+    EXPECT_EQ("start stream=1 dir=sendrecv local=[::1]:6000 remote=10.1.1.1:5000 ext=2\n"
+              "config stream=1 rtcp=0x10\n"
+              "raw target=8 type=1 code=0\n",
+              out.str());
 }
 
 TEST(RecordDecoderStream, ArbitraryBytesDecodeWithoutFault) {

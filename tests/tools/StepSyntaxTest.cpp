@@ -59,12 +59,11 @@ TEST(StepSyntaxRecord, StartFollowsTheDocumentedWireLayout) {
 }
 
 TEST(StepSyntaxRecord, DirectionsByNameOrNumberAndCodesByStep) {
+    // sendrecv is in the layout above; recvonly is decoded by the vtsp CTest entry.
     EXPECT_EQ(1u, bodyOf(parsed("modify stream=2 dir=inactive").record()).u.stmVideo.dir);
-    EXPECT_EQ(3u, bodyOf(parsed("modify stream=2 dir=recvonly").record()).u.stmVideo.dir);
     EXPECT_EQ(7u, bodyOf(parsed("modify stream=2 dir=7").record()).u.stmVideo.dir);
     EXPECT_EQ(82, bodyOf(parsed("modify stream=2").record()).code);
     EXPECT_EQ(88, bodyOf(parsed("end stream=2").record()).code);
-    EXPECT_EQ(81, bodyOf(parsed("start stream=0x10").record()).code);
     EXPECT_EQ(16u, bodyOf(parsed("start stream=0x10").record()).u.stmVideo.streamId);
 }
 
@@ -83,9 +82,7 @@ TEST(StepSyntaxRecord, ConfigAndRawFillTheirViewsAndTrailer) {
     const VtspCommand body = bodyOf(config);
     EXPECT_EQ(15, body.code);
     EXPECT_EQ(9u, body.u.config.templCode);
-    EXPECT_EQ(0, body.u.config.data[0]);
-    EXPECT_EQ(4, body.u.config.data[1]);
-    EXPECT_EQ(0xd0, body.u.config.data[2]);
+    EXPECT_EQ((std::vector<int16_t>{0, 4, 0xd0}), std::vector<int16_t>(body.u.config.data, body.u.config.data + 3));
     EXPECT_EQ(2u, config.type);
 
     const VPR_Comm raw = parsed("raw target=8 type=3 code=-5").record();
@@ -109,9 +106,7 @@ TEST(StepSyntaxText, FormattedStepsBuildTheSameRecord) {
     // Fields come back in one order, defaults left out.
     EXPECT_EQ("start stream=1 dir=sendrecv local=10.0.0.1:6000 ext=3",
               StepSyntax::format(StepSyntax::fromRecord(parsed("start ext=3 local=10.0.0.1:6000 stream=1 pt=96").record())));
-}
-
-TEST(StepSyntaxText, ARecordWithFieldsNoKeySetsIsNotExact) {
+    // A record with fields no key sets is not exact.
     VPR_Comm record = parsed("start stream=1").record();
     record.body[4] = 7;  // infc
     EXPECT_FALSE(StepSyntax::exact(record));

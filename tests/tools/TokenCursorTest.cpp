@@ -28,18 +28,18 @@ TEST(TokenCursorWords, ComplaintsQuoteWhatWasFound) {
 }
 
 TEST(TokenCursorNumbers, DecimalHexSignAndRange) {
-    int64_t v = 0;
-    EXPECT_TRUE(TokenCursor::parseInteger("42", 0, 100, &v));
-    EXPECT_EQ(42, v);
-    EXPECT_TRUE(TokenCursor::parseInteger("0x1F", 0, 100, &v));
-    EXPECT_EQ(31, v);
-    EXPECT_TRUE(TokenCursor::parseInteger("-0x10", -100, 100, &v));
-    EXPECT_EQ(-16, v);
+    const std::pair<const char*, int64_t> good[] = {{"42", 42}, {"0x1F", 31}, {"-0x10", -16}, {"100", 100}};
+    for (const auto& g : good) {
+        int64_t v = 0;
+        EXPECT_TRUE(TokenCursor::parseInteger(g.first, -100, 100, &v)) << g.first;
+        EXPECT_EQ(g.second, v) << g.first;
+    }
+    int64_t v = 0;  // the widest range a step uses
     EXPECT_TRUE(TokenCursor::parseInteger("4294967295", 0, 0xFFFFFFFFll, &v));
     EXPECT_EQ(4294967295ll, v);
-    for (const char* bad : {"", "-", "0x", "1.5", "12a", " 1", "0x-1", "101", "99999999999999999999999"}) {
+    for (const char* bad : {"", "-", "0x", "1.5", "12a", " 1", "0x-1", "101", "-101", "99999999999999999999999"}) {
         v = 7;
-        EXPECT_FALSE(TokenCursor::parseInteger(bad, 0, 100, &v)) << bad;
+        EXPECT_FALSE(TokenCursor::parseInteger(bad, -100, 100, &v)) << bad;
         EXPECT_EQ(7, v) << bad;
     }
 }

@@ -23,12 +23,21 @@ StreamCommand sampleStart() {
     StreamCommand c;
     c.code = _VTSP_CMD_STREAM_VIDEO_START;
     c.streamId = 5;
-    c.dir = VTSP_STREAM_DIR_SENDRECV;
     c.remoteAddr = address("192.168.1.2", 5000);
     c.remoteControlPort = 5001;
     c.localAddr = address("fe80::1", 6000);
     c.localControlPort = 6001;
     return c;
+}
+
+std::string ipText(const void* addr, bool ipv4) {
+    char text[kIpTextSize];
+    ConvertIpToString(text, addr, ipv4);
+    return text;
+}
+
+bool same(const CmdBuffer& a, const CmdBuffer& b) {
+    return a.type == b.type && a.length == b.length && memcmp(a.getCmd(), b.getCmd(), a.length) == 0;
 }
 
 }  // namespace
@@ -37,82 +46,60 @@ TEST(CmdBuffer, TranslateSwapsOnlyPortsAndIpv6GroupsOfACommand) {
     CmdBuffer cmd = bufferOf(streamRecord(sampleStart()));
     const VtspStmVideoView& v = cmd.command().u.stmVideo;
     // On the wire the port 5000 is the bytes 0x13 0x88.
-    const unsigned char* port = cmd.getCmd() + 216 + 20;
-    EXPECT_EQ(0x13, port[0]);
-    EXPECT_EQ(0x88, port[1]);
+    EXPECT_EQ(0x1388, cmd.getCmd()[216 + 20] << 8 | cmd.getCmd()[216 + 21]);
 
     cmd.translate(true);
-    EXPECT_EQ(5000, v.remoteAddr.port);
-    EXPECT_EQ(5001, v.remoteControlPort);
-    EXPECT_EQ(6000, v.localAddr.port);
-    EXPECT_EQ(6001, v.localControlPort);
-    EXPECT_EQ(0xfe80, v.localAddr.ipv6[0]);
-    EXPECT_EQ(1, v.localAddr.ipv6[7]);
-    const uint8_t octets[4] = {192, 168, 1, 2};
-    EXPECT_EQ(0, memcmp(octets, v.remoteAddr.ipv4, 4));
-
-    char text[kIpTextSize];
-    ConvertIpToString(text, v.remoteAddr.ipv4, true);
-    EXPECT_STREQ("192.168.1.2", text);
-    ConvertIpToString(text, v.localAddr.ipv6, false);
-    EXPECT_STREQ("fe80:0:0:0:0:0:0:1", text);
+    EXPECT_EQ((std::vector<int>{5000, 5001, 6000, 6001, 0xfe80, 1}),
+              (std::vector<int>{v.remoteAddr.port, v.remoteControlPort, v.localAddr.port, v.localControlPort,
+                                v.localAddr.ipv6[0], v.localAddr.ipv6[7]}));
+    EXPECT_EQ("192.168.1.2", ipText(v.remoteAddr.ipv4, true));  // octets are not swapped
 
     // The other direction does nothing to a command, nor host order to a bind request.
     CmdBuffer copy(cmd);
     copy.translate(false);
     EXPECT_EQ(0, memcmp(copy.getCmd(), cmd.getCmd(), kVtspCommandSize));
     std::unique_ptr<CmdBuffer> bind(BindToNet(&v.localAddr, 5));
-    std::vector<unsigned char> before(bind->getCmd(), bind->getCmd() + bind->length);
+    const CmdBuffer before(*bind);
     bind->translate(true);
-    EXPECT_EQ(0, memcmp(before.data(), bind->getCmd(), bind->length));
+    EXPECT_TRUE(same(before, *bind));
     bind->translate(false);
-    EXPECT_EQ(0x17, bind->getCmd()[8 + 20]);  // 6000 big-endian
-    EXPECT_EQ(0x70, bind->getCmd()[8 + 21]);
+    EXPECT_EQ(0x1770, bind->getCmd()[8 + 20] << 8 | bind->getCmd()[8 + 21]);  // 6000 big-endian
 }
 
 TEST(CmdBuffer, AddressTextCoversZerosAndLongestForms) {
-    char text[kIpTextSize];
-    const uint8_t zero4[4] = {};
-    ConvertIpToString(text, zero4, true);
-    EXPECT_STREQ("0.0.0.0", text);
-    const uint16_t zero6[8] = {};
-    ConvertIpToString(text, zero6, false);
-    EXPECT_STREQ("0:0:0:0:0:0:0:0", text);
+    const uint8_t zero4[4] = {}, max4[4] = {255, 255, 255, 255};
+    const uint16_t zero6[8] = {}, one6[8] = {0xfe80, 0, 0, 0, 0, 0, 0, 1};
     const uint16_t full6[8] = {0xffff, 0xffff, 0xffff, 0xffff, 0xffff, 0xffff, 0xffff, 0xffff};
-    ConvertIpToString(text, full6, false);
-    EXPECT_STREQ("ffff:ffff:ffff:ffff:ffff:ffff:ffff:ffff", text);
-    const uint8_t max4[4] = {255, 255, 255, 255};
-    ConvertIpToString(text, max4, true);
-    EXPECT_STREQ("255.255.255.255", text);
+    EXPECT_EQ("0.0.0.0", ipText(zero4, true));
+    EXPECT_EQ("255.255.255.255", ipText(max4, true));
+    EXPECT_EQ("0:0:0:0:0:0:0:0", ipText(zero6, false));
+    EXPECT_EQ("fe80:0:0:0:0:0:0:1", ipText(one6, false));
+    EXPECT_EQ("ffff:ffff:ffff:ffff:ffff:ffff:ffff:ffff", ipText(full6, false));
 }
 
 TEST(CmdBuffer, ComposeFillsTheTrailerByBodyKind) {
+    struct Case {
+        CmdBuffer buffer;
+        uint32_t targetModule, length;
+    };
     OSAL_NetAddress addr = address("10.0.0.1", 6000);
-    std::unique_ptr<CmdBuffer> bind(BindToNet(&addr, 9));
-    ASSERT_EQ(kVprNetBindSize, bind->length);
-    VPR_Comm out{};
-    bind->compose(&out);
-    EXPECT_EQ(1u, out.targetModule);
-    EXPECT_EQ(0u, out.type);
-    EXPECT_EQ(3664u, out.recordLength);
-    EXPECT_EQ(0, memcmp(out.body, bind->getCmd(), kVprNetBindSize));
-    for (size_t i = kVprNetBindSize; i < kVprCommBodySize; ++i) ASSERT_EQ(0, out.body[i]) << i;
-
-    CmdBuffer cmd = bufferOf(streamRecord(sampleStart()));
-    VPR_Comm out2{};
-    cmd.compose(&out2);
-    EXPECT_EQ(0u, out2.targetModule);
-    EXPECT_EQ(3664u, out2.recordLength);
-    EXPECT_EQ(0, memcmp(out2.body, cmd.getCmd(), kVtspCommandSize));
-
-    // An unknown body kind carries nothing.
     unsigned char bytes[kCmdBufferCapacity];
     memset(bytes, 0xAB, sizeof(bytes));
-    CmdBuffer unknown(static_cast<VPR_CommType>(3), bytes);
-    EXPECT_EQ(0u, unknown.length);
-    VPR_Comm out3{};
-    unknown.compose(&out3);
-    for (unsigned char b : out3.body) ASSERT_EQ(0, b);
+    const Case cases[] = {{*std::unique_ptr<CmdBuffer>(BindToNet(&addr, 9)), 1, kVprNetBindSize},
+                          {bufferOf(streamRecord(sampleStart())), 0, kVtspCommandSize},
+                          // An unknown body kind carries nothing.
+                          {CmdBuffer(static_cast<VPR_CommType>(3), bytes), 0, 0}};
+    for (const Case& k : cases) {
+        SCOPED_TRACE(k.length);
+        ASSERT_EQ(k.length, k.buffer.length);
+        VPR_Comm out{};
+        k.buffer.compose(&out);
+        EXPECT_EQ(k.targetModule, out.targetModule);
+        EXPECT_EQ(0u, out.type);
+        EXPECT_EQ(3664u, out.recordLength);
+        EXPECT_EQ(0, memcmp(out.body, k.buffer.getCmd(), k.length));
+        for (size_t i = k.length; i < kVprCommBodySize; ++i) ASSERT_EQ(0, out.body[i]) << i;
+    }
     EXPECT_EQ(kVprType1Size, CmdBuffer(VPR_COMM_TYPE1, bytes).length);
 }
 
@@ -120,7 +107,6 @@ TEST(CmdBuffer, PrintDumpsStreamCommandsOnly) {
     LogCapture log;
     StreamCommand c = sampleStart();
     c.localAddr = address("10.0.0.1", 6000);
-    c.encodeType[0] = 96;
     c.encodeType[1] = 97;
     c.localVideoAsBwKbps = 500;
     c.remoteVideoAsBwKbps = 600;
@@ -144,64 +130,48 @@ TEST(CmdBuffer, PrintDumpsStreamCommandsOnly) {
             "           rtp extension: extension 1, extmapId 3, extmapUri urn:3gpp:video-orientation\n";
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, "cmdbuffer", expected));
 
-    // Configuration commands and other codes below 79 are never dumped.
+    // A URI filling all 128 bytes without a terminator is cut at its field:
+    // "abcd" in confMask right behind it is not part of the dump.
     log.clear();
-    ConfigCommand config;
-    CmdBuffer(VPR_COMM_VTSP_CMD, configRecord(config).body).print();
-    CmdBuffer(VPR_COMM_VTSP_CMD, commandRecord(78).body).print();
-    CmdBuffer(VPR_COMM_VTSP_CMD, commandRecord(-5).body).print();
-    EXPECT_TRUE(log.linesWithTag("cmdbuffer").size() == 3u);  // only the three destructor lines
-    for (const LogLine& line : log.lines()) EXPECT_EQ(ANDROID_LOG_DEBUG, line.priority);
-}
-
-TEST(CmdBuffer, UnterminatedExtensionUriIsCutAtItsField) {
-    LogCapture log;
-    StreamCommand c = sampleStart();
-    c.extmapUri = std::string(200, 'u');  // fills all 128 bytes, no terminator
-    VPR_Comm record = streamRecord(c);
-    VtspCommand* body = reinterpret_cast<VtspCommand*>(record.body);
-    body->u.stmVideo.confMask = 0x64636261;  // "abcd" right behind the URI
-    CmdBuffer cmd(VPR_COMM_VTSP_CMD, record.body);
-    cmd.print();
-    const std::vector<LogLine> lines = log.linesWithTag("cmdbuffer");
-    ASSERT_FALSE(lines.empty());
-    const std::string& dump = lines[0].text;
+    c.extmapUri = std::string(200, 'u');
+    c.confMask = 0x64636261;
+    bufferOf(streamRecord(c)).print();
+    ASSERT_FALSE(log.linesWithTag("cmdbuffer").empty());
+    const std::string& dump = log.linesWithTag("cmdbuffer")[0].text;
     EXPECT_NE(std::string::npos, dump.find("extmapUri " + std::string(128, 'u') + "\n"));
     EXPECT_EQ(std::string::npos, dump.find("abcd"));
+
+    // Configuration commands and other codes below 79 are never dumped.
+    log.clear();
+    CmdBuffer(VPR_COMM_VTSP_CMD, configRecord(ConfigCommand()).body).print();
+    CmdBuffer(VPR_COMM_VTSP_CMD, commandRecord(78).body).print();
+    CmdBuffer(VPR_COMM_VTSP_CMD, commandRecord(-5).body).print();
+    EXPECT_EQ(3u, log.linesWithTag("cmdbuffer").size());  // only the three destructor lines
+    for (const LogLine& line : log.lines()) EXPECT_EQ(ANDROID_LOG_DEBUG, line.priority);
 }
 
 TEST(CmdBuffer, CopiesCarryTheBodyAndCountersStayConsistentAcrossThreads) {
     LogCapture log;
-    CmdBuffer source = bufferOf(streamRecord(sampleStart()));
-    CmdBuffer copy(source);
-    EXPECT_EQ(source.type, copy.type);
-    EXPECT_EQ(source.length, copy.length);
-    EXPECT_EQ(0, memcmp(source.getCmd(), copy.getCmd(), source.length));
+    const CmdBuffer source = bufferOf(streamRecord(sampleStart()));
+    EXPECT_TRUE(same(source, CmdBuffer(source)));
     CmdBuffer assigned;
     EXPECT_EQ(0u, assigned.length);
-    const int32_t before = CmdBuffer::con.load();
+    const int32_t con0 = CmdBuffer::con.load(), des0 = CmdBuffer::des.load();
     assigned = source;
-    EXPECT_EQ(before + 1, CmdBuffer::con.load());  // assignment counts as a construction
-    EXPECT_EQ(0, memcmp(source.getCmd(), assigned.getCmd(), source.length));
+    EXPECT_TRUE(same(source, assigned));
+    EXPECT_EQ(con0 + 1, CmdBuffer::con.load());  // assignment counts as a construction
 
-    const int32_t con0 = CmdBuffer::con.load();
-    const int32_t des0 = CmdBuffer::des.load();
-    constexpr int kThreads = 4;
-    constexpr int kEach = 500;
+    // Buffers made and dropped on several threads are all counted.
     std::vector<std::thread> threads;
-    for (int t = 0; t < kThreads; ++t) {
+    for (int t = 0; t < 4; ++t) {
         threads.emplace_back([] {
-            for (int i = 0; i < kEach; ++i) CmdBuffer b;
+            for (int i = 0; i < 500; ++i) CmdBuffer b;
         });
     }
     for (auto& t : threads) t.join();
-    EXPECT_EQ(con0 + kThreads * kEach, CmdBuffer::con.load());
-    EXPECT_EQ(des0 + kThreads * kEach, CmdBuffer::des.load());
-    // The destructor's line names the new destruction count and the constructions.
-    const std::string last = "~CmdBuffer: " + std::to_string(CmdBuffer::des.load()) + "/";
-    bool found = false;
-    for (const LogLine& line : log.linesWithTag("cmdbuffer")) {
-        if (line.text.rfind(last, 0) == 0) found = true;
-    }
-    EXPECT_TRUE(found);
+    EXPECT_EQ(con0 + 2001, CmdBuffer::con.load());
+    EXPECT_EQ(des0 + 2000, CmdBuffer::des.load());
+    // The last destructor line names both final counts.
+    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, "cmdbuffer",
+                             "~CmdBuffer: " + std::to_string(des0 + 2000) + "/" + std::to_string(con0 + 2001)));
 }

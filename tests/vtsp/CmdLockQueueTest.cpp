@@ -28,10 +28,22 @@ namespace {
 using Elem = std::shared_ptr<CmdBuffer>;
 using Queue = CmdLockQueue<Elem>;
 
-const char* const kRefused = "pushAndSignal: failed to push elem";
-
 Elem command(int32_t code) {
     return std::make_shared<CmdBuffer>(VPR_COMM_VTSP_CMD, vtspcodec::commandRecord(code).body);
+}
+
+// The code of a popped element, -1 for none.
+int32_t codeOf(const Elem& e) { return e == nullptr ? -1 : e->command().code; }
+
+// Pushes a command and returns a handle that tells whether anyone still holds it.
+std::weak_ptr<CmdBuffer> pushed(Queue& queue, int32_t code) {
+    Elem e = command(code);
+    queue.pushAndSignal(e);
+    return e;
+}
+
+size_t refusals(const LogCapture& log) {
+    return log.count(ANDROID_LOG_ERROR, "VTSPManager", "pushAndSignal: failed to push elem");
 }
 
 // Scheduler state of one of our threads ('S' while it sleeps in the kernel).
@@ -42,11 +54,6 @@ char taskState(pid_t tid) {
     return paren == std::string::npos || paren + 2 >= text.size() ? '?' : text[paren + 2];
 }
 
-struct Popped {
-    bool ok = false;
-    Elem elem;
-};
-
 // A consumer thread blocked in waitAndPop. Its result is a future, so a test
 // can tell "still waiting" from "returned" without sleeping blindly.
 class Consumer {
@@ -56,9 +63,8 @@ public:
         std::future<pid_t> tidReady = tid.get_future();
         mResult = std::async(std::launch::async, [&queue, tid = std::move(tid)]() mutable {
             tid.set_value(static_cast<pid_t>(syscall(SYS_gettid)));
-            Popped p;
-            p.ok = queue.waitAndPop(p.elem);
-            return p;
+            Elem elem;
+            return queue.waitAndPop(elem) ? codeOf(elem) : -2;
         });
         mTid = tidReady.get();
     }
@@ -78,37 +84,45 @@ public:
     // True once the thread sleeps inside waitAndPop; a push or close that
     // comes after this really has to wake it.
     bool sleeping() const {
-        const auto deadline = std::chrono::steady_clock::now() + 5s;
-        while (std::chrono::steady_clock::now() < deadline) {
-            if (mResult.wait_for(0s) == std::future_status::ready) return false;
+        for (auto deadline = std::chrono::steady_clock::now() + 5s; std::chrono::steady_clock::now() < deadline;
+             std::this_thread::sleep_for(1ms)) {
+            if (returnedWithin(0ms)) return false;
             if (taskState(mTid) == 'S') return true;
-            std::this_thread::sleep_for(1ms);
         }
         return false;
     }
     bool returnedWithin(std::chrono::milliseconds window) const {
         return mResult.wait_for(window) == std::future_status::ready;
     }
-    Popped result() { return mResult.get(); }
+    // The popped code, or -2 when waitAndPop answered false.
+    int32_t result() { return returnedWithin(5s) ? mResult.get() : -3; }
 
 private:
     Queue& mQueue;
-    std::future<Popped> mResult;
+    std::future<int32_t> mResult;
     pid_t mTid = 0;
 };
 
 }  // namespace
 
-TEST(CmdLockQueue, NeverStartedQueueRefusesPushesAndDoesNotWait) {
+TEST(CmdLockQueue, ClosedQueueRefusesPushesAndDoesNotWait) {
     LogCapture log;
     Queue queue;
     Elem elem = command(81);
-    queue.pushAndSignal(elem);
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, "VTSPManager", kRefused));
+    queue.pushAndSignal(elem);  // never started
+    EXPECT_EQ(1u, refusals(log));
     EXPECT_EQ(1, elem.use_count());  // the refused element is neither kept nor released
-
     Elem out;
     EXPECT_FALSE(queue.waitAndPop(out));  // closed: returns at once
+    EXPECT_EQ(nullptr, out);
+
+    // Destroy releases what it held and delivers none of it.
+    queue.start();
+    std::weak_ptr<CmdBuffer> held[] = {pushed(queue, 81), pushed(queue, 82), pushed(queue, 88)};
+    for (auto& w : held) ASSERT_FALSE(w.expired());
+    queue.destroy();
+    for (auto& w : held) EXPECT_TRUE(w.expired());
+    EXPECT_FALSE(queue.waitAndPop(out));
     EXPECT_EQ(nullptr, out);
 }
 
@@ -121,61 +135,46 @@ TEST(CmdLockQueue, ElementsLeaveInTheOrderTheyCame) {
     EXPECT_EQ(2, first.use_count());  // the queue holds its own reference
     queue.pushAndSignal(command(82));
     queue.pushAndSignal(command(88));
-
+    Elem out;
     for (int32_t code : {81, 82, 88}) {
-        Elem out;
         ASSERT_TRUE(queue.waitAndPop(out));
-        EXPECT_EQ(code, out->command().code);
+        EXPECT_EQ(code, codeOf(out));
     }
+    // Popping into an occupied element released its earlier command, and the
+    // queue kept no reference of its own.
     EXPECT_EQ(1, first.use_count());
-    EXPECT_EQ(0u, log.count(ANDROID_LOG_ERROR, "VTSPManager", kRefused));
+    EXPECT_EQ(1, out.use_count());
+    EXPECT_EQ(0u, refusals(log));
 }
 
-TEST(CmdLockQueue, BlockedConsumerWakesWithThePushedElement) {
+TEST(CmdLockQueue, PushWakesAWaitingConsumerAndDestroyReleasesItAndEveryLaterWait) {
     Queue queue;
     queue.start();
-    Consumer consumer(queue);
-    ASSERT_TRUE(consumer.sleeping());
+    Consumer woken(queue);
+    ASSERT_TRUE(woken.sleeping());
     queue.pushAndSignal(command(82));
-    ASSERT_TRUE(consumer.returnedWithin(5s));
-    Popped p = consumer.result();
-    EXPECT_TRUE(p.ok);
-    ASSERT_NE(nullptr, p.elem);
-    EXPECT_EQ(82, p.elem->command().code);
-}
+    EXPECT_EQ(82, woken.result());
 
-TEST(CmdLockQueue, DestroyReleasesAWaitingConsumerAndEveryLaterWait) {
-    Queue queue;
-    queue.start();
-    Consumer consumer(queue);
-    ASSERT_TRUE(consumer.sleeping());
+    Consumer released(queue);
+    ASSERT_TRUE(released.sleeping());
     queue.destroy();
-    ASSERT_TRUE(consumer.returnedWithin(5s));
-    Popped p = consumer.result();
-    EXPECT_FALSE(p.ok);
-    EXPECT_EQ(nullptr, p.elem);
-
-    Popped again;
-    again.elem = command(15);
-    again.ok = queue.waitAndPop(again.elem);  // a hang here fails the test by its time limit
-    EXPECT_FALSE(again.ok);
-    ASSERT_NE(nullptr, again.elem);
-    EXPECT_EQ(15, again.elem->command().code);  // the output is left as it was
+    EXPECT_EQ(-2, released.result());
+    Elem out = command(15);
+    EXPECT_FALSE(queue.waitAndPop(out));  // a hang here fails the test by its time limit
+    EXPECT_EQ(15, codeOf(out));           // the output is left as it was
 
     // A closed queue can be started again.
     queue.start();
     queue.pushAndSignal(command(88));
-    Elem out;
     ASSERT_TRUE(queue.waitAndPop(out));
-    EXPECT_EQ(88, out->command().code);
+    EXPECT_EQ(88, codeOf(out));
 }
 
 TEST(CmdLockQueue, ResetDiscardsRefusesAndKeepsTheConsumerWaitingUntilRestarted) {
     LogCapture log;
     Queue queue;
     queue.start();
-    std::weak_ptr<CmdBuffer> a = [&] { Elem e = command(81); queue.pushAndSignal(e); return e; }();
-    std::weak_ptr<CmdBuffer> b = [&] { Elem e = command(82); queue.pushAndSignal(e); return e; }();
+    std::weak_ptr<CmdBuffer> a = pushed(queue, 81), b = pushed(queue, 82);
     ASSERT_FALSE(a.expired());
     queue.reset();
     EXPECT_TRUE(a.expired());
@@ -188,44 +187,11 @@ TEST(CmdLockQueue, ResetDiscardsRefusesAndKeepsTheConsumerWaitingUntilRestarted)
 
     Elem refused = command(88);
     queue.pushAndSignal(refused);
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, "VTSPManager", kRefused));
+    EXPECT_EQ(1u, refusals(log));
     EXPECT_EQ(1, refused.use_count());
     EXPECT_FALSE(consumer.returnedWithin(50ms));
 
     queue.start();
     queue.pushAndSignal(command(15));
-    ASSERT_TRUE(consumer.returnedWithin(5s));
-    Popped p = consumer.result();
-    EXPECT_TRUE(p.ok);
-    ASSERT_NE(nullptr, p.elem);
-    EXPECT_EQ(15, p.elem->command().code);  // nothing from before the reset survived
-}
-
-TEST(CmdLockQueue, DestroyReleasesHeldElementsAndDeliversNoneOfThem) {
-    Queue queue;
-    queue.start();
-    std::weak_ptr<CmdBuffer> held[3];
-    for (auto& w : held) {
-        Elem e = command(81);
-        queue.pushAndSignal(e);
-        w = e;
-    }
-    for (auto& w : held) ASSERT_FALSE(w.expired());
-    queue.destroy();
-    for (auto& w : held) EXPECT_TRUE(w.expired());
-    Elem out;
-    EXPECT_FALSE(queue.waitAndPop(out));
-    EXPECT_EQ(nullptr, out);
-}
-
-TEST(CmdLockQueue, PoppingIntoAnOccupiedElementReleasesItsEarlierCommand) {
-    Queue queue;
-    queue.start();
-    Elem out = command(81);
-    std::weak_ptr<CmdBuffer> earlier = out;
-    queue.pushAndSignal(command(82));
-    ASSERT_TRUE(queue.waitAndPop(out));
-    EXPECT_TRUE(earlier.expired());
-    EXPECT_EQ(82, out->command().code);
-    EXPECT_EQ(1, out.use_count());  // the queue kept no reference of its own
+    EXPECT_EQ(15, consumer.result());  // nothing from before the reset survived
 }

@@ -17,33 +17,29 @@
 
 using namespace android;
 using namespace vtspcodec;
+using ::testing::Contains;
+using ::testing::Not;
+using ::testing::StartsWith;
+using V = std::vector<std::string>;
 
 namespace {
 
 constexpr uint32_t kVtspId = 5;
 const std::string kOpen = "Mvd_Open(\"10.0.0.1\", 6000, out=1) = 0";
 const std::string kStartCodec = "{pt=96 br=600000 fps=30 480x640}";
-const std::string kAttachFront =
-        "Mvd_CaptureAttach(1, \"Camera 1, Facing front, Orientation 270\") = 0";
-using V = std::vector<std::string>;
+const std::string kAttachFront = "Mvd_CaptureAttach(1, \"Camera 1, Facing front, Orientation 270\") = 0";
 // What a modify that changes nothing asks of engine stream 1 after a start.
-const V kQuiet = {"Mvd_SetUniqueName(1, \"Remote\") = 0",
-                  "Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
+const V kQuiet = {"Mvd_SetUniqueName(1, \"Remote\") = 0", "Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
                   "Mvd_RedSetEnable(1, 0) = 0"};
+// The bind request answering a start of stream 5 on 10.0.0.1:6000.
+const std::string kBind = "bind 7, stream 5, 10.0.0.1:6000, type 0";
 
 V then(V first, const V& rest) {
     first.insert(first.end(), rest.begin(), rest.end());
     return first;
 }
 
-CmdBuffer hostOrder(const VPR_Comm& record) {
-    CmdBuffer b(VPR_COMM_VTSP_CMD, record.body);
-    b.translate(true);
-    return b;
-}
-
-StreamCommand command(int32_t code, uint32_t dir, uint16_t remotePort = 5000,
-                      const char* remoteIp = "192.168.1.2") {
+StreamCommand command(int32_t code, uint32_t dir, uint16_t remotePort = 5000, const char* remoteIp = "192.168.1.2") {
     StreamCommand c;
     c.code = code;
     c.streamId = kVtspId;
@@ -52,16 +48,27 @@ StreamCommand command(int32_t code, uint32_t dir, uint16_t remotePort = 5000,
     c.remoteAddr = remotePort != 0 ? address(remoteIp, remotePort) : noAddress();
     return c;
 }
-
 StreamCommand start(uint32_t dir) { return command(_VTSP_CMD_STREAM_VIDEO_START, dir); }
 StreamCommand modify(uint32_t dir) { return command(_VTSP_CMD_STREAM_VIDEO_MODITY, dir); }
+StreamCommand end(uint32_t dir) { return command(_VTSP_CMD_STREAM_VIDEO_END, dir); }
 
-ConfigCommand rtcpMask(int16_t on, int16_t mask) {
+VPR_Comm rtcpMask(int16_t on, int16_t mask) {
     ConfigCommand c;
     c.data[0] = on;
     c.data[1] = static_cast<int16_t>(kVtspId);
     c.data[2] = mask;
-    return c;
+    return configRecord(c);
+}
+
+// A reply's bind request in host order, "" for anything else; its bytes
+// after the address must be zero.
+std::string bindText(const std::unique_ptr<CmdBuffer>& reply) {
+    if (reply == nullptr || reply->type != VPR_COMM_NET || reply->length != kVprNetBindSize) return "";
+    VprNetBind b;
+    memcpy(&b, reply->getCmd(), sizeof(b));
+    for (uint8_t byte : b.reserved) if (byte != 0) return "reserved bytes set";
+    return "bind " + std::to_string(b.code) + ", stream " + std::to_string(b.streamId) + ", " +
+           endpointText(b.addr) + ", type " + std::to_string(b.addr.type);
 }
 
 class StreamInfoMvdTest : public ::testing::Test {
@@ -70,27 +77,33 @@ protected:
         hostfakes::reset();
         table->fill(CameraCodecParameter::CODEC_H264);
         table->fill(CameraCodecParameter::CODEC_OTHER);
-        stream = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+        stream = makeStream();
     }
     ~StreamInfoMvdTest() override {
         stream.reset();
         hostfakes::reset();
     }
 
-    std::unique_ptr<StreamInfoMvd> makeStream(CameraCodecParameter::CameraConfigEnum config) {
+    std::unique_ptr<StreamInfoMvd> makeStream(
+            CameraCodecParameter::CameraConfigEnum config = CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS) {
         return std::make_unique<StreamInfoMvd>(table, config, kFrontCameraName);
     }
 
-    // Runs one command and returns the engine calls it made; the reply is
-    // kept for the test to look at.
-    std::vector<std::string> run(const VPR_Comm& record, StreamInfoMvd* s = nullptr) {
+    // The engine calls `fn` makes; lines() then holds only its lines.
+    template <typename Fn>
+    V callsOf(Fn fn) {
+        log.clear();
         const size_t mark = hostfakes::callCount();
-        reply.reset((s != nullptr ? s : stream.get())->parse(hostOrder(record)));
+        fn();
         return hostfakes::callTextsSince(mark);
     }
-    std::vector<std::string> run(const StreamCommand& c, StreamInfoMvd* s = nullptr) {
-        return run(streamRecord(c), s);
+    // Runs one command in host order; the reply is kept for the test.
+    V run(const VPR_Comm& record, StreamInfoMvd* s = nullptr) {
+        CmdBuffer b(VPR_COMM_VTSP_CMD, record.body);
+        b.translate(true);
+        return callsOf([&] { reply.reset((s != nullptr ? s : stream.get())->parse(b)); });
     }
+    V run(const StreamCommand& c, StreamInfoMvd* s = nullptr) { return run(streamRecord(c), s); }
 
     // Starts the stream sending and receiving with its codec applied.
     void startRunning() {
@@ -100,16 +113,10 @@ protected:
         log.clear();
     }
 
-    // The stream's log lines, each prefixed with its priority letter.
-    std::vector<std::string> lines() const {
-        std::vector<std::string> out;
-        for (const LogLine& l : log.linesWithTag("CmdclbMVD")) {
-            const char* p = l.priority == ANDROID_LOG_ERROR  ? "E "
-                          : l.priority == ANDROID_LOG_INFO   ? "I "
-                          : l.priority == ANDROID_LOG_DEBUG  ? "D "
-                                                             : "? ";
-            out.push_back(p + l.text);
-        }
+    // The stream's log lines, each prefixed with its priority letter as logcat shows it.
+    V lines() const {
+        V out;
+        for (const LogLine& l : log.linesWithTag("CmdclbMVD")) out.push_back("??VDIWEF"[l.priority & 7] + (" " + l.text));
         return out;
     }
 
@@ -121,25 +128,14 @@ protected:
 
 }  // namespace
 
-using ::testing::Contains;
-using ::testing::Not;
-
 TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
-    const V calls = run(start(VTSP_STREAM_DIR_SENDRECV));
-    EXPECT_EQ((V{kOpen,
-                 "Mvd_TptSetSend(1, 1) = 0",
-                 "Mvd_TptSetRecv(1, 1) = 0",
-                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
-                 "Mvd_SetUniqueName(1, \"Remote\") = 0",
-                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0",
-                 "Mvd_ArsSetEnable(1, 1) = 0",
-                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0",
-                 "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
-                 "Mvd_SetSendPayload(1, 96) = 0",
-                 "Mvd_RedSetEnable(1, 0) = 0",
-                 "Mvd_ProcStart(1) = 0",
+    EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0",
+                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0", "Mvd_SetUniqueName(1, \"Remote\") = 0",
+                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0", "Mvd_ArsSetEnable(1, 1) = 0",
+                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0", "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
+                 "Mvd_SetSendPayload(1, 96) = 0", "Mvd_RedSetEnable(1, 0) = 0", "Mvd_ProcStart(1) = 0",
                  kAttachFront}),
-              calls);
+              run(start(VTSP_STREAM_DIR_SENDRECV)));
     // A stream command read through the configuration view names no RTCP
     // template, so the initial mask stays and no feedback switch is touched.
     EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START",
@@ -158,71 +154,49 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
               lines());
     EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
     EXPECT_EQ(kVtspId, stream->mStreamId);
-    EXPECT_EQ(1u, stream->mMvdStreamId);
-
-    // The reply is a bind request carrying the local end in host order.
-    ASSERT_NE(nullptr, reply);
-    EXPECT_EQ(VPR_COMM_NET, reply->type);
-    ASSERT_EQ(kVprNetBindSize, reply->length);
-    VprNetBind bind;
-    memcpy(&bind, reply->getCmd(), sizeof(bind));
-    EXPECT_EQ(7u, bind.code);
-    EXPECT_EQ(5, bind.streamId);
-    EXPECT_EQ(6000, bind.addr.port);
-    EXPECT_EQ(0u, bind.addr.type);
-    EXPECT_EQ("10.0.0.1", addressText(bind.addr));
-    for (uint8_t b : bind.reserved) ASSERT_EQ(0, b);
-    reply->translate(false);
-    EXPECT_EQ(0x17, reply->getCmd()[8 + 20]);  // 6000, big-endian for the modem
-    EXPECT_EQ(0x70, reply->getCmd()[8 + 21]);
+    EXPECT_EQ(kBind, bindText(reply));  // the local end, in host order until the link sends it
 }
 
 TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
     startRunning();
-    // Held: processing stops, nothing restarts it.
-    EXPECT_EQ(then({"Mvd_ProcStop(1) = 0"}, kQuiet), run(modify(_VTSP_STREAM_DIR_INACTIVE)));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
-    EXPECT_TRUE(stream->isAlive());
-    // The local end, once known, is neither re-read nor logged again.
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_MODITY",
-                 "D <<<<<<<<<<<<<<<_VTSP_STREAM_DIR_INACTIVE>>>>>>>>>>>>>>>",
-                 "D commandModifyHandler: Mvd_SetUniqueName(), streamId 1, renderid Remote, ret 0",
-                 "D rtcpParamConfig Recive RTCP mask, templCode: 5, data[0]: 1, data[2]: 0, mRTCPEnableMask: 208",
-                 "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
-                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
-                 "D rtcpParamConfig: return"}),
-              lines());
-
-    // Back to both directions: transport on, processing and camera restart.
-    EXPECT_EQ(then(then({"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0"}, kQuiet),
-                   {"Mvd_ProcStart(1) = 0", kAttachFront}),
-              run(modify(VTSP_STREAM_DIR_SENDRECV)));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(1, stream->mProcStartCnt);
-
-    // The same direction again switches nothing and does not start twice.
-    EXPECT_EQ(kQuiet, run(modify(VTSP_STREAM_DIR_SENDRECV)));
-
-    EXPECT_EQ(then({"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 0) = 0"}, kQuiet),
-              run(modify(VTSP_STREAM_DIR_SENDONLY)));
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, stream->mStat);
-    EXPECT_EQ(then({"Mvd_TptSetSend(1, 0) = 0", "Mvd_TptSetRecv(1, 1) = 0"}, kQuiet),
-              run(modify(VTSP_STREAM_DIR_RECVONLY)));
-    EXPECT_EQ(StreamInfoMvd::STREAM_RECVONLY, stream->mStat);
-
-    // An unknown direction leaves the state; direction "ended" stops processing.
-    EXPECT_EQ(kQuiet, run(modify(7)));
-    EXPECT_EQ(StreamInfoMvd::STREAM_RECVONLY, stream->mStat);
-    EXPECT_EQ(then({"Mvd_ProcStop(1) = 0"}, kQuiet), run(modify(_VTSP_STREAM_DIR_ENDED)));
-    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
-    EXPECT_FALSE(stream->isAlive());
-    EXPECT_EQ(0, stream->mProcStartCnt);
-
-    const V logged = lines();
-    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDONLY>>>>>>>>>>>>>>>>>"));
-    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<<VTSP_STREAM_DIR_RECVONLY>>>>>>>>>>>>>>>>>>"));
-    EXPECT_THAT(logged, Contains("D <<<<<<<<<<<<<<_VTSP_STREAM_DIR_ENDED>>>>>>>>>>>>>>>>>"));
+    struct Step {
+        uint32_t dir;
+        V before, after;  // the calls around the quiet part
+        int32_t stat, procStarts;
+        std::string banner;
+    };
+    const V both = {"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0"};
+    const Step steps[] = {
+        // Held: processing stops, nothing restarts it.
+        {_VTSP_STREAM_DIR_INACTIVE, {"Mvd_ProcStop(1) = 0"}, {}, StreamInfoMvd::STREAM_INACTIVE, 0,
+         "<<<<<<<<<<<<<<<_VTSP_STREAM_DIR_INACTIVE>>>>>>>>>>>>>>>"},
+        // Back to both directions: transport on, processing and camera restart.
+        {VTSP_STREAM_DIR_SENDRECV, both, {"Mvd_ProcStart(1) = 0", kAttachFront}, StreamInfoMvd::STREAM_SENDRECV, 1,
+         "<<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>"},
+        // The same direction again switches nothing and does not start twice.
+        {VTSP_STREAM_DIR_SENDRECV, {}, {}, StreamInfoMvd::STREAM_SENDRECV, 1, ""},
+        {VTSP_STREAM_DIR_SENDONLY, {"Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 0) = 0"}, {},
+         StreamInfoMvd::STREAM_SENDONLY, 1, "<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDONLY>>>>>>>>>>>>>>>>>"},
+        {VTSP_STREAM_DIR_RECVONLY, {"Mvd_TptSetSend(1, 0) = 0", "Mvd_TptSetRecv(1, 1) = 0"}, {},
+         StreamInfoMvd::STREAM_RECVONLY, 1, "<<<<<<<<<<<<<<<VTSP_STREAM_DIR_RECVONLY>>>>>>>>>>>>>>>>>>"},
+        // An unknown direction leaves the state; direction "ended" stops processing.
+        {7, {}, {}, StreamInfoMvd::STREAM_RECVONLY, 1, ""},
+        {_VTSP_STREAM_DIR_ENDED, {"Mvd_ProcStop(1) = 0"}, {}, StreamInfoMvd::STREAM_ENDED, 0,
+         "<<<<<<<<<<<<<<_VTSP_STREAM_DIR_ENDED>>>>>>>>>>>>>>>>>"},
+    };
+    for (const Step& s : steps) {
+        SCOPED_TRACE(s.dir);
+        EXPECT_EQ(then(then(s.before, kQuiet), s.after), run(modify(s.dir)));
+        EXPECT_EQ(nullptr, reply);
+        EXPECT_EQ(s.stat, stream->mStat);
+        EXPECT_EQ(s.stat != StreamInfoMvd::STREAM_ENDED, stream->isAlive());
+        EXPECT_EQ(s.procStarts, stream->mProcStartCnt);
+        // The local end, once known, is neither re-read nor logged again.
+        EXPECT_THAT(lines(), Not(Contains(StartsWith("D local"))));
+        if (!s.banner.empty()) {
+            EXPECT_THAT(lines(), Contains("D " + s.banner));
+        }
+    }
 }
 
 TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillReplies) {
@@ -232,7 +206,6 @@ TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillRepli
     EXPECT_EQ(nullptr, reply);
     EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local \\0[0]"}), lines());
 
-    log.clear();
     StreamCommand portZero = modify(VTSP_STREAM_DIR_SENDRECV);
     portZero.localAddr = address("10.0.0.1", 0);
     EXPECT_EQ(V{}, run(portZero));
@@ -241,13 +214,9 @@ TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillRepli
     EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
 
     // The bind request still goes out so the modem learns the local end.
-    log.clear();
     hostfakes::setResult("Mvd_Open", -1);
-    EXPECT_EQ((V{"Mvd_Open(\"10.0.0.1\", 6000, out=0) = -1"}),
-              run(start(VTSP_STREAM_DIR_SENDRECV)));
-    ASSERT_NE(nullptr, reply);
-    EXPECT_EQ(VPR_COMM_NET, reply->type);
-    EXPECT_EQ(7u, reinterpret_cast<const VprNetBind*>(reply->getCmd())->code);
+    EXPECT_EQ((V{"Mvd_Open(\"10.0.0.1\", 6000, out=0) = -1"}), run(start(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_EQ(kBind, bindText(reply));
     EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local 10.0.0.1\\6000[1]",
                  "E commandModifyHandler: Failed to Mvd_open, ip:10.0.0.1, port: 6000"}),
               lines());
@@ -255,56 +224,42 @@ TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillRepli
     EXPECT_EQ(0u, stream->mMvdStreamId);
 
     // Codes that are not stream commands are ignored silently.
-    log.clear();
     EXPECT_EQ(V{}, run(commandRecord(20)));
     EXPECT_EQ(nullptr, reply);
     EXPECT_EQ(V{}, lines());
 }
 
-TEST_F(StreamInfoMvdTest, StartWithoutRemoteOpensButProcessesOnlyOnceTheRemoteIsKnown) {
+TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
     EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0"}),
               run(command(_VTSP_CMD_STREAM_VIDEO_START, VTSP_STREAM_DIR_SENDRECV, 0)));
-    ASSERT_NE(nullptr, reply);
+    EXPECT_EQ(kBind, bindText(reply));
     EXPECT_THAT(lines(), Contains("D remote \\0[0]"));
     EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
     EXPECT_EQ(0, stream->mProcStartCnt);
 
-    // The stream was already active, so the first codec set suspends the
+    // Processing starts only once the remote is known. The stream was
+    // already active, so the first codec set suspends the
     // engine's streams and the same command resumes them.
-    EXPECT_EQ((V{"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
-                 "Mvd_SetUniqueName(1, \"Remote\") = 0",
-                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0",
-                 "Mvd_SuspendAllStrm() = 0",
-                 "Mvd_ArsSetEnable(1, 1) = 0",
-                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0",
-                 "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
-                 "Mvd_SetSendPayload(1, 96) = 0",
-                 "Mvd_RedSetEnable(1, 0) = 0",
-                 "Mvd_ResumeAllStrm() = 0",
-                 "Mvd_ProcStart(1) = 0",
-                 kAttachFront}),
+    EXPECT_EQ((V{"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0", "Mvd_SetUniqueName(1, \"Remote\") = 0",
+                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0", "Mvd_SuspendAllStrm() = 0",
+                 "Mvd_ArsSetEnable(1, 1) = 0", "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0",
+                 "Mvd_SetCdc(1, " + kStartCodec + ") = 0", "Mvd_SetSendPayload(1, 96) = 0",
+                 "Mvd_RedSetEnable(1, 0) = 0", "Mvd_ResumeAllStrm() = 0", "Mvd_ProcStart(1) = 0", kAttachFront}),
               run(modify(VTSP_STREAM_DIR_SENDRECV)));
     EXPECT_EQ(nullptr, reply);
     EXPECT_THAT(lines(), Contains("D codecParamConfig Mvd_SuspendAllStrm, codec params changed "));
-}
 
-TEST_F(StreamInfoMvdTest, OnlyANewRemotePortReachesTheEngine) {
-    startRunning();
-    EXPECT_EQ(kQuiet, run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5000,
-                                  "192.168.1.99")));
-
+    // Only a new port reaches the engine.
+    EXPECT_EQ(kQuiet, run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5000, "192.168.1.99")));
     // The address stays the first one learnt; the port change is resumed
     // by the same command.
-    EXPECT_EQ(then(then({"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5002) = 0"}, kQuiet),
-                   {"Mvd_ResumeAllStrm() = 0"}),
-              run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5002,
-                          "192.168.1.99")));
-    EXPECT_THAT(lines(),
-                Contains("D socketRemoteParamConfig: Port changed, Mvd_SetRmtAddr,port: 5002, ret 0"));
+    EXPECT_EQ(then(then({"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5002) = 0"}, kQuiet), {"Mvd_ResumeAllStrm() = 0"}),
+              run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5002, "192.168.1.99")));
+    EXPECT_THAT(lines(), Contains("D socketRemoteParamConfig: Port changed, Mvd_SetRmtAddr,port: 5002, ret 0"));
     EXPECT_FALSE(stream->mParamChanged);
 
     // IPv6 ends, in either type value, are passed as eight full groups.
-    auto v6 = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+    auto v6 = makeStream();
     StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
     c.localAddr = address("fe80::1", 6000);
     c.localAddr.type = kAddrTypeIpv6Alt;
@@ -323,21 +278,18 @@ TEST_F(StreamInfoMvdTest, RateControlFollowsTheBandwidthCapAndTheFrameRate) {
         int upper;
     };
     // 4194304 kbit/s overflows to 0 and so means no cap, like 0 itself.
-    const Case cases[] = {{500, 512000},     {0, 960000},       {2000, 960000}, {937, 959488},
-                          {938, 960000},     {4194304, 960000}, {4194305, 1024}};
+    const Case cases[] = {{500, 512000}, {0, 960000},       {2000, 960000},  {937, 959488},
+                          {938, 960000}, {4194304, 960000}, {4194305, 1024}};
     unsigned id = 0;
     for (const Case& k : cases) {
-        ++id;
-        auto s = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
+        auto s = makeStream();
         StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
         c.localVideoAsBwKbps = k.kbps;
-        EXPECT_THAT(run(c, s.get()),
-                    Contains("Mvd_ArsSetParm(" + std::to_string(id) + ", 100000, " +
-                             std::to_string(k.upper) + ", 20, 30) = 0"))
+        EXPECT_THAT(run(c, s.get()), Contains("Mvd_ArsSetParm(" + std::to_string(++id) + ", 100000, " +
+                                              std::to_string(k.upper) + ", 20, 30) = 0"))
                 << k.kbps;
     }
 
-    log.clear();
     auto slow = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_15FPS);
     StreamCommand c = start(VTSP_STREAM_DIR_SENDRECV);
     c.encodeType[0] = 100;
@@ -350,43 +302,38 @@ TEST_F(StreamInfoMvdTest, RateControlFollowsTheBandwidthCapAndTheFrameRate) {
 }
 
 TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
+    const V reachedTheCodec = {kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0",
+                               "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
+                               "Mvd_SetUniqueName(1, \"Remote\") = 0"};
     // An encoder other than 0 is refused before the codec is read.
     StreamCommand other = start(VTSP_STREAM_DIR_SENDRECV);
     other.encoder = 1;
-    EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0",
-                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0",
-                 "Mvd_SetUniqueName(1, \"Remote\") = 0"}),
-              run(other));
-    EXPECT_NE(nullptr, reply);
+    EXPECT_EQ(reachedTheCodec, run(other));
+    EXPECT_EQ(kBind, bindText(reply));
     EXPECT_THAT(lines(), Contains("D codec type 1 is not supported "));
     EXPECT_EQ(0, stream->mProcStartCnt);
 
     // A codec that cannot be read is left alone and the stream still runs.
+    stream = makeStream();
+    hostfakes::reset();
     hostfakes::setResult("Mvd_GetCdc", -1);
-    log.clear();
-    auto unread = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    EXPECT_EQ((V{"Mvd_Open(\"10.0.0.1\", 6000, out=2) = 0", "Mvd_TptSetSend(2, 1) = 0",
-                 "Mvd_TptSetRecv(2, 1) = 0", "Mvd_SetRmtAddr(2, \"192.168.1.2\", 5000) = 0",
-                 "Mvd_SetUniqueName(2, \"Remote\") = 0",
-                 "Mvd_GetCdc(2, \"H264\", out=-) = -1",
-                 "Mvd_RedSetEnable(2, 0) = 0", "Mvd_ProcStart(2) = 0",
-                 "Mvd_CaptureAttach(2, \"Camera 1, Facing front, Orientation 270\") = 0"}),
-              run(start(VTSP_STREAM_DIR_SENDRECV), unread.get()));
+    EXPECT_EQ(then(reachedTheCodec, {"Mvd_GetCdc(1, \"H264\", out=-) = -1", "Mvd_RedSetEnable(1, 0) = 0",
+                                     "Mvd_ProcStart(1) = 0", kAttachFront}),
+              run(start(VTSP_STREAM_DIR_SENDRECV)));
     EXPECT_THAT(lines(), Contains("E checkIfCodecParamUpdated: GetCodec failed !!!"));
-    hostfakes::clearResult("Mvd_GetCdc");
 
     // A codec the engine refuses stops the command before processing.
+    stream = makeStream();
+    hostfakes::reset();
     hostfakes::setResult("Mvd_SetCdc", -1);
-    log.clear();
-    auto refused = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    const V calls = run(start(VTSP_STREAM_DIR_SENDRECV), refused.get());
+    const V calls = run(start(VTSP_STREAM_DIR_SENDRECV));
     ASSERT_FALSE(calls.empty());
-    EXPECT_EQ("Mvd_SetCdc(3, " + kStartCodec + ") = -1", calls.back());
-    EXPECT_THAT(calls, Contains("Mvd_ArsSetParm(3, 100000, 960000, 20, 30) = 0"));
-    EXPECT_NE(nullptr, reply);
+    EXPECT_EQ("Mvd_SetCdc(1, " + kStartCodec + ") = -1", calls.back());
+    EXPECT_THAT(calls, Contains("Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0"));
+    EXPECT_EQ(kBind, bindText(reply));
     EXPECT_EQ("E codecParamConfig: SetCodec failed !!!", lines().back());
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, refused->mStat);
-    EXPECT_EQ(0, refused->mProcStartCnt);
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
+    EXPECT_EQ(0, stream->mProcStartCnt);
 }
 
 TEST_F(StreamInfoMvdTest, OnlyTheVideoOrientationUriSetsTheExtension) {
@@ -404,28 +351,24 @@ TEST_F(StreamInfoMvdTest, OnlyTheVideoOrientationUriSetsTheExtension) {
     c.code = _VTSP_CMD_STREAM_VIDEO_MODITY;
     c.extmapId = 0x103;  // only the low byte is the id
     EXPECT_THAT(run(c), Contains("Mvd_RtpSetExt(1, 2, 3) = 0"));
-
     for (const char* uri : {"urn:3gpp:video-orientation:7", "urn:3gpp:video-orientatio", ""}) {
         c.extmapUri = uri;
-        EXPECT_THAT(run(c), Not(Contains(::testing::StartsWith("Mvd_RtpSetExt")))) << uri;
+        EXPECT_THAT(run(c), Not(Contains(StartsWith("Mvd_RtpSetExt")))) << uri;
     }
 
     // A URI filling its whole field is read as exactly those 128 characters;
     // the bytes behind it ("abcd" in confMask) are not part of it.
-    log.clear();
     c.extmapUri = "urn:3gpp:video-orientation" + std::string(102, 'x');
     c.confMask = 0x64636261;
-    EXPECT_THAT(run(c), Not(Contains(::testing::StartsWith("Mvd_RtpSetExt"))));
-    EXPECT_THAT(lines(), Contains("D rtcpParamConfigMvd_RtpSetExt, extension: 1, uri: " +
-                                  c.extmapUri + ", id: 259"));
+    EXPECT_THAT(run(c), Not(Contains(StartsWith("Mvd_RtpSetExt"))));
+    EXPECT_THAT(lines(), Contains("D rtcpParamConfigMvd_RtpSetExt, extension: 1, uri: " + c.extmapUri + ", id: 259"));
 }
 
 TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
     startRunning();
-    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_SuspendAllStrm() = 0",
-                 "Mvd_TptEnableTmmbr(1, 0) = 0", "Mvd_TptEnableNack(1, 1) = 0",
-                 "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
-              run(configRecord(rtcpMask(1, 0x30))));
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_SuspendAllStrm() = 0", "Mvd_TptEnableTmmbr(1, 0) = 0",
+                 "Mvd_TptEnableNack(1, 1) = 0", "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
+              run(rtcpMask(1, 0x30)));
     EXPECT_EQ(nullptr, reply);
     EXPECT_EQ((V{"D _VTSP_CMD_CONFIG",
                  "D Recive RTCP mask 48",
@@ -442,26 +385,24 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
     EXPECT_FALSE(stream->mParamChanged);
 
     // The same mask again changes nothing; a disabled template is ignored.
-    log.clear();
-    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(1, 0x30))));
-    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(2, 0x80))));
-    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(configRecord(rtcpMask(-1, 0x80))));
+    for (int16_t on : {1, 2, -1}) {
+        EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0"}), run(rtcpMask(on, on == 1 ? 0x30 : 0x80))) << on;
+        EXPECT_THAT(lines(), Contains("D rtcpParamConfig: return")) << on;
+    }
     EXPECT_THAT(lines(), Contains("D rtcpParamConfig Recive RTCP mask, templCode: 23, "
                                   "data[0]: -1, data[2]: 128, mRTCPEnableMask: 16"));
-    EXPECT_EQ(3u, log.count(ANDROID_LOG_DEBUG, "CmdclbMVD", "rtcpParamConfig: return"));
     EXPECT_EQ(0x10, stream->mRTCPEnableMask);
 
     // The suspend was lifted by the configuration itself: the next modify
     // has nothing to resume.
     EXPECT_EQ(kQuiet, run(modify(VTSP_STREAM_DIR_SENDRECV)));
-    EXPECT_FALSE(stream->mParamChanged);
 
     // A held stream switches feedback without suspending anything; a
     // negative mask is sign-extended before the kept bits are taken.
     run(modify(_VTSP_STREAM_DIR_INACTIVE));
-    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_TptEnableTmmbr(1, 1) = 0",
-                 "Mvd_TptEnableNack(1, 1) = 0", "Mvd_TptEnableFir(1, 1) = 0"}),
-              run(configRecord(rtcpMask(1, -1))));
+    EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_TptEnableTmmbr(1, 1) = 0", "Mvd_TptEnableNack(1, 1) = 0",
+                 "Mvd_TptEnableFir(1, 1) = 0"}),
+              run(rtcpMask(1, -1)));
     EXPECT_EQ(0xD0, stream->mRTCPEnableMask);
     EXPECT_FALSE(stream->mParamChanged);
     EXPECT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
@@ -472,16 +413,15 @@ TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive)
     // Words the stream does not own come back to the engine unchanged.
     tagMVD_CODEC seeded{};
     ASSERT_TRUE(hostfakes::getMvdCodec(1, &seeded));
-    for (int i : {1, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19}) {
-        seeded.aiWord[i] = 7000 + i;
-    }
+    for (int i : {1, 6, 7, 8, 9, 10, 11, 12, 13, 14, 15, 16, 17, 18, 19}) seeded.aiWord[i] = 7000 + i;
     hostfakes::setMvdCodec(1, seeded);
-
-    size_t mark = hostfakes::callCount();
-    stream->setCodecParam(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS);
+    const std::string qvga15 = "{pt=96 br=256000 fps=15 240x320}";
+    const auto setTo = [&](CameraCodecParameter::CameraConfigEnum config) {
+        return callsOf([&] { stream->setCodecParam(config); });
+    };
     EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0", "Mvd_SuspendAllStrm() = 0",
-                 "Mvd_SetCdc(1, {pt=96 br=256000 fps=15 240x320}) = 0", "Mvd_ResumeAllStrm() = 0"}),
-              hostfakes::callTextsSince(mark));
+                 "Mvd_SetCdc(1, " + qvga15 + ") = 0", "Mvd_ResumeAllStrm() = 0"}),
+              setTo(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS));
     EXPECT_EQ((V{"D setCodecParam Mvd_SuspendAllStrm, codec params changed "}), lines());
     tagMVD_CODEC stored{};
     ASSERT_TRUE(hostfakes::getMvdCodec(1, &stored));
@@ -490,21 +430,15 @@ TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive)
     for (int i = 0; i < 20; ++i) EXPECT_EQ(expected[i], stored.aiWord[i]) << i;
 
     // The same configuration again only reads the codec.
-    mark = hostfakes::callCount();
-    stream->setCodecParam(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS);
-    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", {pt=96 br=256000 fps=15 240x320}) = 0"}),
-              hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + qvga15 + ") = 0"}),
+              setTo(CameraCodecParameter::CAMERA_QVGA_REVERSED_15FPS));
 
     // A refused codec does not leave the engine suspended: the streams go on
     // with the codec they had, and the next modify applies the new one.
-    log.clear();
     hostfakes::setResult("Mvd_SetCdc", -1);
-    mark = hostfakes::callCount();
-    stream->setCodecParam(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", {pt=96 br=256000 fps=15 240x320}) = 0",
-                 "Mvd_SuspendAllStrm() = 0", "Mvd_SetCdc(1, " + kStartCodec + ") = -1",
-                 "Mvd_ResumeAllStrm() = 0"}),
-              hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + qvga15 + ") = 0", "Mvd_SuspendAllStrm() = 0",
+                 "Mvd_SetCdc(1, " + kStartCodec + ") = -1", "Mvd_ResumeAllStrm() = 0"}),
+              setTo(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS));
     EXPECT_THAT(lines(), Contains("E setCodecParam: SetCodec failed !!!"));
     EXPECT_FALSE(stream->mParamChanged);
     hostfakes::clearResult("Mvd_SetCdc");
@@ -521,114 +455,89 @@ TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive)
     run(hold);
     ASSERT_TRUE(stream->mParamChanged);
     ASSERT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
-    mark = hostfakes::callCount();
-    stream->setCodecParam(CameraCodecParameter::CAMERA_CIF_30FPS);
     EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
                  "Mvd_SetCdc(1, {pt=96 br=400000 fps=30 352x288}) = 0"}),
-              hostfakes::callTextsSince(mark));
+              setTo(CameraCodecParameter::CAMERA_CIF_30FPS));
     EXPECT_FALSE(stream->mParamChanged);
 }
 
 TEST_F(StreamInfoMvdTest, CaptureAndRenderNamesReachTheEngineOnlyWhenTheyMatter) {
-    const std::string frontCopy = kFrontCameraName;  // same text, other pointer
+    const std::string frontCopy = kFrontCameraName, remoteCopy = kRemoteRenderName;  // same text, other pointer
     const std::string view = "RemoteView";
-    const std::string remoteCopy = kRemoteRenderName;
-    stream->setCaptureId(nullptr);
-    stream->setCaptureId(frontCopy.c_str());
-    stream->setRenderId(nullptr);
-    stream->setRenderId(remoteCopy.c_str());
-    // Not open yet: the new name is taken and logged, nothing is attached.
-    stream->setCaptureId(kBackCameraName);
-    EXPECT_EQ(0u, hostfakes::callCount());
+    // Not open yet: only a new name is taken and logged, nothing is attached.
+    EXPECT_EQ(V{}, callsOf([&] {
+                  stream->setCaptureId(nullptr);
+                  stream->setCaptureId(frontCopy.c_str());
+                  stream->setRenderId(nullptr);
+                  stream->setRenderId(remoteCopy.c_str());
+                  stream->setCaptureId(kBackCameraName);
+              }));
     EXPECT_EQ((V{"D setCaptureId: setCaptureId(), [Camera 1, Facing front, Orientation 270] -> "
                  "[Camera 0, Facing back, Orientation 90]"}),
               lines());
 
     // Send-only: the render name waits for the next modify.
-    run(start(VTSP_STREAM_DIR_SENDONLY));
-    EXPECT_THAT(hostfakes::callTexts(),
+    EXPECT_THAT(run(start(VTSP_STREAM_DIR_SENDONLY)),
                 Contains("Mvd_CaptureAttach(1, \"Camera 0, Facing back, Orientation 90\") = 0"));
-    log.clear();
-    size_t mark = hostfakes::callCount();
-    stream->setRenderId(view.c_str());
-    EXPECT_EQ(V{}, hostfakes::callTextsSince(mark));
+    EXPECT_EQ(V{}, callsOf([&] { stream->setRenderId(view.c_str()); }));
     EXPECT_EQ(V{}, lines());
-    EXPECT_THAT(run(modify(VTSP_STREAM_DIR_SENDONLY)),
-                Contains("Mvd_SetUniqueName(1, \"RemoteView\") = 0"));
+    EXPECT_THAT(run(modify(VTSP_STREAM_DIR_SENDONLY)), Contains("Mvd_SetUniqueName(1, \"RemoteView\") = 0"));
 
     // Receiving: the render name and the camera go to the engine at once.
     run(modify(VTSP_STREAM_DIR_RECVONLY));
-    mark = hostfakes::callCount();
-    stream->setRenderId("Remote");
-    stream->setCaptureId(kFrontCameraName);
-    EXPECT_EQ((V{"Mvd_SetUniqueName(1, \"Remote\") = 0",
-                 kAttachFront}),
-              hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"Mvd_SetUniqueName(1, \"Remote\") = 0", kAttachFront}), callsOf([&] {
+                  stream->setRenderId("Remote");
+                  stream->setCaptureId(kFrontCameraName);
+              }));
 
     // Held: names are stored but nothing is attached or renamed.
     run(modify(_VTSP_STREAM_DIR_INACTIVE));
-    mark = hostfakes::callCount();
-    stream->setCaptureId(kBackCameraName);
-    stream->setRenderId(view.c_str());
-    EXPECT_EQ(V{}, hostfakes::callTextsSince(mark));
+    EXPECT_EQ(V{}, callsOf([&] {
+                  stream->setCaptureId(kBackCameraName);
+                  stream->setRenderId(view.c_str());
+              }));
     EXPECT_STREQ(kBackCameraName, stream->mCaptureId);
     EXPECT_STREQ("RemoteView", stream->mRenderId);
 }
 
 TEST_F(StreamInfoMvdTest, ReplacedImageNeedsAnEngineStream) {
-    stream->sendReplacedImage(true, "/x.jpg");
-    EXPECT_EQ(0u, hostfakes::callCount());
-    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg",
-                 "D sendReplacedImage no valid stream"}),
-              lines());
+    EXPECT_EQ(V{}, callsOf([&] { stream->sendReplacedImage(true, "/x.jpg"); }));
+    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg", "D sendReplacedImage no valid stream"}), lines());
 
     startRunning();
-    size_t mark = hostfakes::callCount();
-    stream->sendReplacedImage(true, "/x.jpg");
-    stream->sendReplacedImage(false, "/x.jpg");
-    EXPECT_EQ((V{"Mvd_FileStartSendImage(1, \"/x.jpg\") = 0", "Mvd_FileStopSendImage(1) = 0"}),
-              hostfakes::callTextsSince(mark));
-    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg",
-                 "I sendReplacedImage, stop, path = /x.jpg"}),
+    EXPECT_EQ((V{"Mvd_FileStartSendImage(1, \"/x.jpg\") = 0", "Mvd_FileStopSendImage(1) = 0"}), callsOf([&] {
+                  stream->sendReplacedImage(true, "/x.jpg");
+                  stream->sendReplacedImage(false, "/x.jpg");
+              }));
+    EXPECT_EQ((V{"I sendReplacedImage, start, path = /x.jpg", "I sendReplacedImage, stop, path = /x.jpg"}),
               lines());
 }
 
 TEST_F(StreamInfoMvdTest, EndStopsWhatRunsAndDestructionClosesTheEngineStream) {
     // Destroyed while running: the engine stream is closed.
     startRunning();
-    size_t mark = hostfakes::callCount();
-    stream.reset();
-    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), hostfakes::callTextsSince(mark));
+    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), callsOf([&] { stream.reset(); }));
     EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(1), stat 3"}), lines());
 
     // Never opened: nothing to stop or close.
-    log.clear();
-    auto fresh = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    mark = hostfakes::callCount();
-    EXPECT_EQ(V{}, run(command(_VTSP_CMD_STREAM_VIDEO_END, VTSP_STREAM_DIR_SENDRECV), fresh.get()));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_FALSE(fresh->isAlive());
-    fresh.reset();
-    EXPECT_EQ(mark, hostfakes::callCount());
+    stream = makeStream();
+    EXPECT_EQ(V{}, run(end(VTSP_STREAM_DIR_SENDRECV)));
     EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_END"}), lines());
+    EXPECT_FALSE(stream->isAlive());
+    EXPECT_EQ(V{}, callsOf([&] { stream.reset(); }));
 
     // Running: the camera is detached and processing stops; closing is left
     // to destruction.
-    auto running = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    run(start(VTSP_STREAM_DIR_SENDRECV), running.get());
-    EXPECT_EQ((V{"Mvd_CaptureDetach(2) = 0", "Mvd_ProcStop(2) = 0"}),
-              run(command(_VTSP_CMD_STREAM_VIDEO_END, VTSP_STREAM_DIR_SENDRECV), running.get()));
+    stream = makeStream();
+    run(start(VTSP_STREAM_DIR_SENDRECV));
+    EXPECT_EQ((V{"Mvd_CaptureDetach(2) = 0", "Mvd_ProcStop(2) = 0"}), run(end(VTSP_STREAM_DIR_SENDRECV)));
     EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, running->mStat);
-    EXPECT_EQ((std::vector<unsigned>{2}), hostfakes::openMvdStreams());
-    log.clear();
-    running.reset();
+    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
+    EXPECT_EQ((V{"Mvd_Close(2) = 0"}), callsOf([&] { stream.reset(); }));
     EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(2), stat 0"}), lines());
-    EXPECT_EQ(std::vector<unsigned>{}, hostfakes::openMvdStreams());
 
     // Held: processing has already stopped, only the camera is detached.
-    auto held = makeStream(CameraCodecParameter::CAMERA_VGA_REVERSED_30FPS);
-    run(start(_VTSP_STREAM_DIR_INACTIVE), held.get());
-    EXPECT_EQ((V{"Mvd_CaptureDetach(3) = 0"}),
-              run(command(_VTSP_CMD_STREAM_VIDEO_END, _VTSP_STREAM_DIR_INACTIVE), held.get()));
+    stream = makeStream();
+    run(start(_VTSP_STREAM_DIR_INACTIVE));
+    EXPECT_EQ((V{"Mvd_CaptureDetach(3) = 0"}), run(end(_VTSP_STREAM_DIR_INACTIVE)));
 }
