@@ -135,7 +135,8 @@ TEST(RemoteBinder, UnlinkRemovesTheMatchingLinkOnlyAndLinksHoldRecipientsWeakly)
     int cookie = 0;
     remote->linkToDeath(a);
     remote->linkToDeath(b, &cookie, 0);
-    EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(new Recipient()));
+    sp<Recipient> stranger = new Recipient();
+    EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(stranger));
     EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(a, nullptr, 1));  // the flags must match
     wp<IBinder::DeathRecipient> removed;
     EXPECT_EQ(NO_ERROR, remote->unlinkToDeath(a, nullptr, 0, &removed));

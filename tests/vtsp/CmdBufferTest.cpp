@@ -137,7 +137,7 @@ TEST(CmdBuffer, PrintDumpsStreamCommandsOnly) {
     c.confMask = 0x64636261;
     bufferOf(streamRecord(c)).print();
     ASSERT_FALSE(log.linesWithTag("cmdbuffer").empty());
-    const std::string& dump = log.linesWithTag("cmdbuffer")[0].text;
+    const std::string dump = log.linesWithTag("cmdbuffer")[0].text;
     EXPECT_NE(std::string::npos, dump.find("extmapUri " + std::string(128, 'u') + "\n"));
     EXPECT_EQ(std::string::npos, dump.find("abcd"));
 
