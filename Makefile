@@ -4,7 +4,7 @@ BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_TYPE ?= RelWithDebInfo
 
-.PHONY: deps build sim msc test asan tsan sanitizers clean
+.PHONY: deps build sim msc test asan tsan sanitizers fuzz fuzz-build fuzz-run coverage clean
 
 deps:
 	@scripts/install-deps.sh
@@ -24,8 +24,10 @@ msc: build
 	mscgen -T png -o $(BUILD)/call.png $(BUILD)/call.msc
 	@echo "ladder diagram: $(BUILD)/call.png"
 
-test: build
+# The suite, then each fuzz target for a few seconds from its seeds.
+test: build fuzz-build
 	cd $(BUILD) && ctest --output-on-failure -j$(JOBS)
+	@$(MAKE) --no-print-directory fuzz-run FUZZ_SECONDS=5
 
 asan: deps
 	cmake -S . -B build-asan -DCMAKE_BUILD_TYPE=Debug -DQUELLBORN_ASAN=ON
@@ -42,5 +44,47 @@ tsan: deps
 
 sanitizers: asan tsan
 
+# libFuzzer targets built with clang in their own directory; `make fuzz
+# FUZZ_SECONDS=600` runs each for ten minutes.
+FUZZ_BUILD ?= build-fuzz
+FUZZ_SECONDS ?= 10
+
+fuzz-build: deps
+	cmake -S . -B $(FUZZ_BUILD) -DCMAKE_BUILD_TYPE=RelWithDebInfo -DCMAKE_C_COMPILER=clang \
+	  -DCMAKE_CXX_COMPILER=clang++ -DQUELLBORN_FUZZ=ON -DQUELLBORN_TESTS=OFF
+	cmake --build $(FUZZ_BUILD) -j$(JOBS) --target fuzz_records fuzz_transactions fuzz_zmf_events fuzz_mvd_events
+
+fuzz-run:
+	scripts/run-fuzz.sh $(FUZZ_BUILD) $(FUZZ_SECONDS)
+
+fuzz: fuzz-build
+	@$(MAKE) --no-print-directory fuzz-run
+
+# Line and function coverage of the system's code (vtsp/, volte_engine/,
+# mme_jni/) from the whole test suite: build-coverage/coverage/index.html,
+# totals per directory printed at the end (needs lcov, installed here on
+# first use).
+COV = build-coverage
+COV_DIRS = vtsp volte_engine mme_jni
+coverage: deps
+	@scripts/install-deps.sh lcov
+	cmake -S . -B $(COV) -DCMAKE_BUILD_TYPE=Debug -DQUELLBORN_COVERAGE=ON
+	cmake --build $(COV) -j$(JOBS)
+	lcov --quiet --zerocounters --directory $(COV)
+	lcov --quiet --capture --initial --directory $(COV) --output-file $(COV)/base.info
+	cd $(COV) && ctest --output-on-failure -j$(JOBS)
+	lcov --quiet --capture --directory $(COV) --output-file $(COV)/run.info
+	lcov --quiet --add-tracefile $(COV)/base.info --add-tracefile $(COV)/run.info --output-file $(COV)/all.info
+	lcov --quiet --extract $(COV)/all.info $(foreach d,$(COV_DIRS),'$(CURDIR)/$(d)/*') --output-file $(COV)/system.info
+	rm -rf $(COV)/coverage
+	genhtml --quiet --prefix $(CURDIR) --title "quellborn system code" --output-directory $(COV)/coverage $(COV)/system.info
+	@for d in $(COV_DIRS); do \
+	  lcov --quiet --extract $(COV)/system.info '$(CURDIR)/'$$d'/*' --output-file $(COV)/$$d.info; \
+	  echo "== $$d/"; lcov --summary $(COV)/$$d.info 2>&1 | grep -E '^ *(lines|functions)'; \
+	done
+	@echo "== system total (vtsp/ volte_engine/ mme_jni/)"
+	@lcov --summary $(COV)/system.info 2>&1 | grep -E '^ *(lines|functions)'
+	@echo "report: $(COV)/coverage/index.html"
+
 clean:
-	rm -rf build build-asan build-tsan
+	rm -rf build build-asan build-tsan build-fuzz build-coverage

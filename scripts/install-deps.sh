@@ -11,6 +11,7 @@ PACKAGES=(
   android-libutils-dev android-liblog-dev android-libcutils-dev android-libbase-dev
   android-platform-frameworks-native-headers android-libnativehelper-dev
   default-jdk-headless
+  clang libclang-rt-14-dev
   "$@"
 )
 

@@ -209,6 +209,17 @@ TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
     EXPECT_TRUE(called("camdrvOrientAngle(270) = 0"));
 }
 
+TEST_F(CameraTest, ExtremeOrientationsGiveTheTruncatedRemaindersWithoutOverflow) {
+    EXPECT_EQ(0, setCamera(0));
+    setSurface(kLocalView);
+    setSurface(kRemoteView);
+    // (360 + 2^31) mod 360 = 128; (720 + 2^31 - 90 * (2^31 - 1)) mod 360 = -142.
+    EXPECT_EQ((Strings{"camdrvOrientAngle(128) = 0", rotateText(kBack, -142), rotateText(kRemote, -142)}),
+              orientCalls(INT32_MIN, INT32_MAX, 2));
+    EXPECT_EQ((Strings{"camdrvOrientAngle(-127) = 0", rotateText(kBack, 233), rotateText(kRemote, 233)}),
+              orientCalls(INT32_MAX, INT32_MIN, 3));
+}
+
 TEST_F(CameraTest, SwitchingCamerasClosesTheOpenOneFirst) {
     EXPECT_EQ(0, setCamera(1));
     setSurface(kLocalView);

@@ -40,12 +40,14 @@ const char* VideoCallEngineImpl::captureName(int cameraId) {
     return cameraId == kFrontCameraId ? kFrontCameraName : kBackCameraName;
 }
 
+// The client may send any int32 orientation: worked out in 64 bits the
+// formulas cannot overflow, and every remainder fits an int again.
 int VideoCallEngineImpl::cameraAngle() const {
-    return (360 - mDeviceOrientation) % 360;
+    return static_cast<int>((360LL - mDeviceOrientation) % 360);
 }
 
 int VideoCallEngineImpl::displayAngle() const {
-    return (720 - mDeviceOrientation - 90 * mScreenOrientation) % 360;
+    return static_cast<int>((720LL - mDeviceOrientation - 90LL * mScreenOrientation) % 360);
 }
 
 int VideoCallEngineImpl::getCameraSizeFromQos() {
