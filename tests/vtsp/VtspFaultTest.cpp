@@ -1,6 +1,6 @@
 // Faults on the modem command link's real descriptors: a record arriving one
 // byte at a time, SIGUSR1 storms on the link's threads, a device that refuses
-// writes, stop and start between records, and destroy while records flow.
+// reads or writes for a while, stop and start between records, and destroy while records flow.
 // Every record accepted while the link runs must be handled exactly once and
 // every reply must be written whole.
 #include <android/log.h>
@@ -183,6 +183,37 @@ TEST_F(VtspFaultTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
     EXPECT_LT(msSince(before), 1500);
     EXPECT_EQ(-1, link.mFd);
     close(readOnly);
+    close(readWrite);
+}
+
+TEST_F(VtspFaultTest, FailedReadIsRetriedAfterAPauseAndResumes) {
+    startLink();
+    const int writeOnly = open(pty.devicePath(), O_WRONLY | O_NOCTTY);
+    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
+    ASSERT_GE(writeOnly, 0);
+    ASSERT_GE(readWrite, 0);
+    // Once a reply has come back, the receive thread is blocked in its next
+    // read: that read keeps its descriptor, the reads after it fail.
+    pty.writeRecord(streamRecord(startCommand(10)));
+    EXPECT_EQ(range(10, 10), readBinds(1));
+    ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
+    const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
+
+    pty.writeRecord(streamRecord(startCommand(11)));
+    EXPECT_EQ(range(11, 11), readBinds(1));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 1, 5s));
+    const auto first = Clock::now();
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 3s));
+    EXPECT_GT(msSince(first), 1500);  // a pause, not a busy loop
+
+    // The device works again: the next record is read whole and handled once.
+    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
+    pty.writeRecord(streamRecord(startCommand(12)));
+    EXPECT_EQ(range(12, 12), readBinds(1));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(3u, mvdOpens());
+    EXPECT_EQ(3u, recvLines());
+    close(writeOnly);
     close(readWrite);
 }
 
