@@ -18,6 +18,7 @@
 #include <thread>
 #include <vector>
 
+#include "Eventually.h"
 #include "EngineHarness.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
@@ -45,16 +46,6 @@ inline constexpr uint32_t kInit = 0, kSetSurface = 1, kSetCallback = 2, kCleanCa
 enum Target : int32_t { kRemoteView = 0, kLocalView = 1 };
 
 inline std::string quoted(const std::string& text) { return "\"" + text + "\""; }
-
-template <typename Pred>
-bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seconds(5)) {
-    const auto deadline = std::chrono::steady_clock::now() + timeout;
-    while (!pred()) {
-        if (std::chrono::steady_clock::now() >= deadline) return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    return true;
-}
 
 inline Strings plus(Strings calls, const Strings& more) {
     calls.insert(calls.end(), more.begin(), more.end());

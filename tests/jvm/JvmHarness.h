@@ -24,6 +24,7 @@
 #include <utility>
 #include <vector>
 
+#include "Eventually.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
 #include "Mvd.h"
@@ -140,16 +141,6 @@ auto onNativeThread(Fn fn) -> decltype(fn()) {
     std::thread t([&] { result = fn(); });
     t.join();
     return result;
-}
-
-template <typename Pred>
-bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seconds(5)) {
-    const auto deadline = std::chrono::steady_clock::now() + timeout;
-    while (!pred()) {
-        if (std::chrono::steady_clock::now() >= deadline) return false;
-        std::this_thread::sleep_for(std::chrono::milliseconds(2));
-    }
-    return true;
 }
 
 // Base of every JVM case: a fresh call record and log, and at the end no

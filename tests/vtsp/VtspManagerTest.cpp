@@ -17,6 +17,7 @@
 #include <thread>
 #include <vector>
 
+#include "Eventually.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
 #include "ModemPty.h"
@@ -68,14 +69,6 @@ bool linkThreads(size_t count, bool sleepingOnly = false) {
 
 long long msSince(Clock::time_point t) {
     return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - t).count();
-}
-
-template <typename Pred>
-bool eventually(Pred pred, std::chrono::milliseconds timeout = 5s) {
-    for (const auto deadline = Clock::now() + timeout; !pred(); std::this_thread::sleep_for(2ms)) {
-        if (Clock::now() >= deadline) return false;
-    }
-    return true;
 }
 
 // Waits until the media engine has been asked `text`.
