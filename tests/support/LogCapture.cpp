@@ -13,7 +13,8 @@ std::vector<LogLine> gLines;
 
 void captureLogger(const struct __android_logger_data* data, const char* message) {
     std::lock_guard<std::mutex> lock(gMutex);
-    gLines.push_back(LogLine{data->priority, data->tag != nullptr ? data->tag : "", message});
+    gLines.push_back(LogLine{data->priority, data->tag != nullptr ? data->tag : "", message,
+                             std::chrono::steady_clock::now()});
     gCond.notify_all();
 }
 
@@ -54,6 +55,16 @@ std::vector<LogLine> LogCapture::linesWithTag(const std::string& tag) const {
 size_t LogCapture::count(int priority, const std::string& tag, const std::string& text) const {
     std::lock_guard<std::mutex> lock(gMutex);
     return countLocked(priority, tag, text);
+}
+
+std::chrono::milliseconds LogCapture::firstGap(int priority, const std::string& tag,
+                                               const std::string& text) const {
+    std::vector<std::chrono::steady_clock::time_point> at;
+    for (const LogLine& line : lines()) {
+        if (line.priority == priority && line.tag == tag && line.text == text) at.push_back(line.when);
+    }
+    if (at.size() < 2) return std::chrono::milliseconds(-1);
+    return std::chrono::duration_cast<std::chrono::milliseconds>(at[1] - at[0]);
 }
 
 bool LogCapture::waitFor(int priority, const std::string& tag, const std::string& text,

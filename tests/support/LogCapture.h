@@ -11,6 +11,7 @@ struct LogLine {
     int priority;
     std::string tag;
     std::string text;
+    std::chrono::steady_clock::time_point when;  // when it was logged, not when a test looked
     bool operator==(const LogLine& o) const {
         return priority == o.priority && tag == o.tag && text == o.text;
     }
@@ -31,6 +32,9 @@ public:
     bool contains(int priority, const std::string& tag, const std::string& text) const {
         return count(priority, tag, text) > 0;
     }
+    // Time between the first two lines with exactly this text, as logged
+    // (a slow test thread cannot shorten or stretch it); -1 ms if fewer than two.
+    std::chrono::milliseconds firstGap(int priority, const std::string& tag, const std::string& text) const;
     // Waits until `text` has been logged at least `times` times.
     bool waitFor(int priority, const std::string& tag, const std::string& text, size_t times = 1,
                  std::chrono::milliseconds timeout = std::chrono::seconds(10)) const;

@@ -161,12 +161,8 @@ TEST_F(VtspFaultTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
                                ", err: Bad file descriptor";
 
     pty.writeRecord(streamRecord(startCommand(5)));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 1, 5s));
-    const auto first = Clock::now();
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 3s));
-    EXPECT_GT(msSince(first), 1500);  // a pause, not a busy loop
-    EXPECT_FALSE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 3,
-                             std::chrono::milliseconds(std::max<long long>(0, 2500 - msSince(first)))));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
 
     // The device works again: the pending reply goes out whole, once.
     ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
@@ -180,7 +176,7 @@ TEST_F(VtspFaultTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
     ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 4, 8s));
     const auto before = Clock::now();
     destroyLink();
-    EXPECT_LT(msSince(before), 1500);
+    EXPECT_LT(msSince(before), 1800);  // shorter than the 2 s retry pause
     EXPECT_EQ(-1, link.mFd);
     close(readOnly);
     close(readWrite);
@@ -192,24 +188,22 @@ TEST_F(VtspFaultTest, FailedReadIsRetriedAfterAPauseAndResumes) {
     const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
     ASSERT_GE(writeOnly, 0);
     ASSERT_GE(readWrite, 0);
-    // Once a reply has come back, the receive thread is blocked in its next
-    // read: that read keeps its descriptor, the reads after it fail.
     pty.writeRecord(streamRecord(startCommand(10)));
     EXPECT_EQ(range(10, 10), readBinds(1));
     ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
     const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
 
+    // The receive thread may already sit in a read that keeps the old
+    // descriptor, which record 11 then completes; either way the reads after
+    // that fail, and record 11 is read once, before or after the repair.
     pty.writeRecord(streamRecord(startCommand(11)));
-    EXPECT_EQ(range(11, 11), readBinds(1));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 1, 5s));
-    const auto first = Clock::now();
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 3s));
-    EXPECT_GT(msSince(first), 1500);  // a pause, not a busy loop
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
 
     // The device works again: the next record is read whole and handled once.
     ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
     pty.writeRecord(streamRecord(startCommand(12)));
-    EXPECT_EQ(range(12, 12), readBinds(1));
+    EXPECT_EQ(range(11, 12), readBinds(2));
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(3u, mvdOpens());
     EXPECT_EQ(3u, recvLines());

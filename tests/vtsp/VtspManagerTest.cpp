@@ -245,7 +245,7 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     ASSERT_EQ(2u, openDescriptorsOn(pty.devicePath()));  // ours and the link's
     auto before = Clock::now();
     destroyLink();
-    EXPECT_LT(msSince(before), 1000);
+    EXPECT_LT(msSince(before), 1800);  // woken, not waited for
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, "cmdHandleFunc: cmdHandleFunc: Rx queue is stop"));
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, "cmdTxFunc: cmdTxFunc: Tx queue is stop"));
     EXPECT_EQ(-1, link.mFd);
@@ -283,7 +283,7 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     }));
     before = Clock::now();
     destroyLink();
-    EXPECT_LT(msSince(before), 1000);
+    EXPECT_LT(msSince(before), 1800);  // woken, not waited for
     EXPECT_EQ(-1, link.mFd);
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
@@ -312,7 +312,7 @@ TEST_F(VtspManagerTest, DestroyWithoutThreadsOnlyClosesAnOpenDevice) {
     link.mFd = fd;
     const auto before = Clock::now();
     link.destroy();
-    EXPECT_LT(msSince(before), 500);
+    EXPECT_LT(msSince(before), 1800);
     EXPECT_EQ(-1, link.mFd);
     EXPECT_EQ(-1, fcntl(fd, F_GETFD));
     EXPECT_EQ(EBADF, errno);
@@ -342,13 +342,11 @@ TEST_F(VtspManagerTest, UnreadableDeviceIsRetriedEveryTwoSeconds) {
         ScopedLink broken(device);
         EXPECT_TRUE(broken.init());
         const std::string failed = kReadFailed + std::string(error);
-        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 1, 2s));
-        const auto first = Clock::now();
-        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 3s));
-        EXPECT_GT(msSince(first), 1500);  // a pause, not a busy loop
+        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+        EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
         const auto before = Clock::now();
         broken.destroy();
-        EXPECT_LT(msSince(before), 1000);
+        EXPECT_LT(msSince(before), 1800);  // woken, not waited for
         EXPECT_EQ(2u, log.count(ANDROID_LOG_ERROR, kTag, failed));
     }
 }
