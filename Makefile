@@ -4,7 +4,7 @@ BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_TYPE ?= RelWithDebInfo
 
-.PHONY: deps build sim msc test asan tsan sanitizers fuzz fuzz-build fuzz-run coverage clean
+.PHONY: deps build sim msc bench test asan tsan sanitizers fuzz fuzz-build fuzz-run coverage clean
 
 deps:
 	@scripts/install-deps.sh
@@ -23,6 +23,11 @@ msc: build
 	$(BUILD)/vce-sim --msc $(BUILD)/call.msc > /dev/null
 	mscgen -T png -o $(BUILD)/call.png $(BUILD)/call.msc
 	@echo "ladder diagram: $(BUILD)/call.png"
+
+# The link against the pipe's own limit (docs/performance.md); about a
+# minute. BENCH_ARGS=--quick for a few seconds.
+bench: build
+	$(BUILD)/vtsp-bench $(BENCH_ARGS)
 
 # The suite, then each fuzz target for a few seconds from its seeds.
 test: build fuzz-build

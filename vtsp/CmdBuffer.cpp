@@ -37,6 +37,10 @@ CmdBuffer::CmdBuffer(VPR_CommType type_, const unsigned char* bytes)
     ++con;
 }
 
+std::shared_ptr<CmdBuffer> CmdBuffer::fromRecord(const VPR_Comm& record) {
+    return std::shared_ptr<CmdBuffer>(new CmdBuffer(VPR_COMM_VTSP_CMD, record.body));
+}
+
 CmdBuffer::CmdBuffer(const CmdBuffer& other) : type(other.type), length(other.length), cmd{} {
     memcpy(cmd, other.cmd, length);
     ++con;

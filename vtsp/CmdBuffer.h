@@ -4,6 +4,7 @@
 
 #include <atomic>
 #include <cstdint>
+#include <memory>
 
 #include "VprComm.h"
 
@@ -14,6 +15,8 @@ public:
     CmdBuffer();
     // Copies the body length of `type` from `bytes`; an unknown type copies nothing.
     CmdBuffer(VPR_CommType type, const unsigned char* bytes);
+    // The command body of a received record, as the link queues it.
+    static std::shared_ptr<CmdBuffer> fromRecord(const VPR_Comm& record);
     CmdBuffer(const CmdBuffer& other);
     CmdBuffer& operator=(const CmdBuffer& other);
     ~CmdBuffer();

@@ -173,8 +173,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
                                 static_cast<int>(record->type));
             continue;
         }
-        vm->mRxQueue.pushAndSignal(
-                std::shared_ptr<CmdBuffer>(new CmdBuffer(VPR_COMM_VTSP_CMD, record->body)));
+        vm->mRxQueue.pushAndSignal(CmdBuffer::fromRecord(*record));
     }
     vm->mRxEnded = true;
     return nullptr;

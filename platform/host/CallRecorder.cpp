@@ -92,12 +92,14 @@ int CallRecorder::resultFor(const std::string& function, int natural) {
 
 int CallRecorder::record(const std::string& function, std::vector<std::string> args, int result) {
     std::lock_guard<std::mutex> lock(mMutex);
-    mCalls.push_back(Call{function, std::move(args), result});
     ++mSeq;
+    if (!mKeep && mTrace == nullptr) return result;
+    Call call{function, std::move(args), result};
     if (mTrace != nullptr) {
-        fprintf(mTrace, "qb-trace %lu %s\n", mSeq, mCalls.back().text().c_str());
+        fprintf(mTrace, "qb-trace %lu %s\n", mSeq, call.text().c_str());
         fflush(mTrace);
     }
+    if (mKeep) mCalls.push_back(std::move(call));
     return result;
 }
 
@@ -125,6 +127,11 @@ void CallRecorder::setResult(const std::string& function, int result) {
 void CallRecorder::clearResult(const std::string& function) {
     std::lock_guard<std::mutex> lock(mMutex);
     mResults.erase(function);
+}
+
+void CallRecorder::setRecording(bool keep) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    mKeep = keep;
 }
 
 void CallRecorder::addResetHook(std::function<void()> hook) {
@@ -180,5 +187,6 @@ void setResult(const std::string& function, int result) {
 }
 void clearResult(const std::string& function) { CallRecorder::instance().clearResult(function); }
 void setTrace(const char* target) { CallRecorder::instance().setTrace(target); }
+void setRecording(bool keep) { CallRecorder::instance().setRecording(keep); }
 
 }  // namespace hostfakes

@@ -42,6 +42,7 @@ public:
     void setResult(const std::string& function, int result);
     void clearResult(const std::string& function);
     void setTrace(const char* target);
+    void setRecording(bool keep);
 
     // Each fake registers how to forget its state on reset().
     void addResetHook(std::function<void()> hook);
@@ -61,6 +62,7 @@ private:
     std::vector<std::function<void()>> mResetHooks;
     FILE* mTrace = nullptr;
     bool mOwnsTrace = false;
+    bool mKeep = true;
     unsigned long mSeq = 0;
 };
 

@@ -33,6 +33,11 @@ std::vector<std::string> callNames();
 std::vector<std::string> callTextsSince(size_t from);
 size_t callCount();
 
+// Keeps each call in the record (the default) or lets it pass unkept (the
+// trace still sees it). Long benchmarks switch keeping off so that the
+// record's own growth is not mistaken for the system's. reset() keeps the setting.
+void setRecording(bool keep);
+
 // Makes every later call of `function` return `result` (and skip its effect,
 // as a failing library call would).
 void setResult(const std::string& function, int result);

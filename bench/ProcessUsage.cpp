@@ -1,0 +1,69 @@
+#include "ProcessUsage.h"
+
+#include <dirent.h>
+#include <malloc.h>
+#include <time.h>
+
+#include <fstream>
+#include <sstream>
+
+namespace processusage {
+
+namespace {
+
+// The value of a "Key:   value" line of a /proc status file, 0 if absent.
+long long statusField(const std::string& path, const std::string& key) {
+    std::ifstream in(path);
+    std::string line;
+    while (std::getline(in, line)) {
+        if (line.compare(0, key.size() + 1, key + ":") == 0) {
+            return std::stoll(line.substr(key.size() + 1));
+        }
+    }
+    return 0;
+}
+
+std::string firstLine(const std::string& path) {
+    std::ifstream in(path);
+    std::string line;
+    std::getline(in, line);
+    return line;
+}
+
+}  // namespace
+
+size_t residentBytes() {
+    return static_cast<size_t>(statusField("/proc/self/status", "VmRSS")) * 1024;
+}
+
+size_t heapInUse() {
+    return mallinfo2().uordblks;
+}
+
+long long processCpuNs() {
+    struct timespec ts {};
+    clock_gettime(CLOCK_PROCESS_CPUTIME_ID, &ts);
+    return static_cast<long long>(ts.tv_sec) * 1000000000LL + ts.tv_nsec;
+}
+
+std::map<std::string, ThreadUsage> threadsNamed(const std::string& prefix) {
+    std::map<std::string, ThreadUsage> out;
+    DIR* dir = opendir("/proc/self/task");
+    if (dir == nullptr) return out;
+    while (const dirent* entry = readdir(dir)) {
+        if (entry->d_name[0] == '.') continue;
+        const std::string task = std::string("/proc/self/task/") + entry->d_name;
+        const std::string name = firstLine(task + "/comm");
+        if (name.compare(0, prefix.size(), prefix) != 0) continue;
+        ThreadUsage usage;
+        // schedstat: nanoseconds on the CPU, nanoseconds waiting, time slices.
+        std::istringstream(firstLine(task + "/schedstat")) >> usage.cpuNs;
+        usage.wakeups = statusField(task + "/status", "voluntary_ctxt_switches") +
+                        statusField(task + "/status", "nonvoluntary_ctxt_switches");
+        out[name] = usage;
+    }
+    closedir(dir);
+    return out;
+}
+
+}  // namespace processusage
