@@ -1,6 +1,7 @@
 #include "CmdBuffer.h"
 
 #include <android/log.h>
+#include <log/log_main.h>
 
 #include <cstdio>
 #include <cstring>
@@ -83,6 +84,9 @@ void CmdBuffer::print() const {
     if (type != VPR_COMM_VTSP_CMD) return;
     const VtspCommand& c = command();
     if (c.code < kFirstPrintedCode) return;
+    // Building the dump is the costliest step of handling a command; skip it
+    // when the handset's log level would drop the line anyway.
+    if (!__android_log_is_loggable(ANDROID_LOG_INFO, kTag, ANDROID_LOG_VERBOSE)) return;
 
     const VtspArgView& a = c.u.arg;
     const VtspStmVideoView& v = c.u.stmVideo;

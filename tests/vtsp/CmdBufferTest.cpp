@@ -148,6 +148,16 @@ TEST(CmdBuffer, PrintDumpsStreamCommandsOnly) {
     CmdBuffer(VPR_COMM_VTSP_CMD, commandRecord(-5).body).print();
     EXPECT_EQ(3u, log.linesWithTag("cmdbuffer").size());  // only the three destructor lines
     for (const LogLine& line : log.lines()) EXPECT_EQ(ANDROID_LOG_DEBUG, line.priority);
+
+    // The dump is an info line: a handset logging from info up still gets
+    // it, one logging only warnings does not.
+    for (const auto& [level, dumps] : {std::pair{ANDROID_LOG_INFO, 1u}, std::pair{ANDROID_LOG_WARN, 0u}}) {
+        log.clear();
+        __android_log_set_minimum_priority(level);
+        cmd.print();
+        __android_log_set_minimum_priority(ANDROID_LOG_VERBOSE);
+        EXPECT_EQ(dumps, log.count(ANDROID_LOG_INFO, "cmdbuffer", expected)) << level;
+    }
 }
 
 TEST(CmdBuffer, CopiesCarryTheBodyAndCountersStayConsistentAcrossThreads) {
