@@ -398,10 +398,17 @@ Options parseOptions(int argc, char** argv) {
         } else if (arg == "--log" && hasValue) {
             o.logTarget = argv[++i];
         } else {
-            fprintf(stderr,
+            const bool help = arg == "--help";
+            fprintf(help ? stdout : stderr,
                     "usage: vtsp-bench [--quick] [--rounds N] [--records N] [--commands N]\n"
-                    "                  [--idle-seconds N] [--log FILE]\n");
-            exit(2);
+                    "                  [--idle-seconds N] [--log FILE]\n"
+                    "  --rounds N        start-to-bind and echo round trips (2000)\n"
+                    "  --records N       records per throughput run (20000)\n"
+                    "  --commands N      modifies for the memory run (1000000)\n"
+                    "  --idle-seconds N  how long the idle link is watched (10)\n"
+                    "  --log FILE        where the shipped logging writes (/dev/null)\n"
+                    "  --quick           small counts and 1 s idle, for a smoke run\n");
+            exit(help ? 0 : 2);
         }
     }
     if (o.latencyRounds == 0 || o.throughputRecords == 0 || o.millionCommands == 0 || o.idleSeconds <= 0) {
