@@ -131,29 +131,39 @@ void VideoCallEngineImpl::init(int loopback) {
 }
 
 void VideoCallEngineImpl::setNotifyCallback(const sp<IVideoCallEngineCallback>& callback) {
-    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    std::lock_guard<std::mutex> change(mCallbackChangeLock);
     LOGI("%s, callback %p", "setNotifyCallback", callback.get());
-    // Only client operations change the callback, and they hold mOpLock, so
-    // it can be tested here without mLock.
+    // Only callback changes write the callback, and they hold
+    // mCallbackChangeLock, so it can be tested here without mLock.
     if (callback != nullptr && mNotifyCallback != nullptr) {
         LOGI("VCE is not released as expected");
-        release();
+        releaseCall();
     }
     ScopedPthreadLock lock(mLock);
     mNotifyCallback = callback;
 }
 
 void VideoCallEngineImpl::release() {
-    std::lock_guard<std::recursive_mutex> op(mOpLock);
-    LOGI("release");
-    mAutoRotate = 1;
-    mDeviceOrientation = 0;
-    mScreenOrientation = 0;
-    mRemoteRotation = 0;
-    setRemoteSurface(nullptr);
-    setPreviewSurface(nullptr);
-    setCameraId(-1);
-    if (mLoopback) stopLoopBack();
+    std::lock_guard<std::mutex> change(mCallbackChangeLock);
+    releaseCall();
+}
+
+void VideoCallEngineImpl::releaseCall() {
+    {
+        std::lock_guard<std::recursive_mutex> op(mOpLock);
+        LOGI("release");
+        mAutoRotate = 1;
+        mDeviceOrientation = 0;
+        mScreenOrientation = 0;
+        mRemoteRotation = 0;
+        setRemoteSurface(nullptr);
+        setPreviewSurface(nullptr);
+        setCameraId(-1);
+        if (mLoopback) stopLoopBack();
+    }
+    // Waiting for a notification in progress without mOpLock: the client's
+    // handler may call back into the engine before it returns (the binder
+    // driver runs such a call on the notifying thread), and that call needs mOpLock.
     {
         ScopedPthreadLock lock(mLock);
         mNotifyCallback.clear();

@@ -10,7 +10,10 @@
 // Locking: the client's operations arrive on several binder threads; one
 // engine-wide lock (mOpLock, recursive because operations build on each
 // other) serialises them. mLock guards only the client callback and is held
-// for each notification; it is always taken after mOpLock, never before.
+// for each notification, the client's handler included; it is never taken
+// while mOpLock is held, because that handler may call back into the engine.
+// Callback changes (set, clean, release) are serialised by
+// mCallbackChangeLock, taken before either of the others.
 #ifndef QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
 #define QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
 
@@ -118,12 +121,15 @@ private:
     int cameraAngle() const;
     int displayAngle() const;
     int notifyLocked(int event, const int* args);
+    // release() for a caller that holds mCallbackChangeLock.
+    void releaseCall();
     // Starts a detached thread that removes a render (the engine does not wait).
     void startRenderRemoval(const char* renderId);
     bool addRenderFor(const char* caller, const sp<IGraphicBufferProducer>& producer,
                       const char* renderId);
 
     std::recursive_mutex mOpLock;
+    std::mutex mCallbackChangeLock;
 
     static VideoCallEngineImpl* sInstance;
 };

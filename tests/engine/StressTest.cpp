@@ -1,0 +1,205 @@
+// The engine loaded from every side at once: client threads sending the
+// service's transactions, the modem starting, holding, resuming and ending
+// streams on the link's pipe, and the media libraries raising events on their
+// own threads. Each side counts what it did: every request must be answered,
+// every stream start get exactly one bind request, and every event reach the
+// client, or be dropped for want of a callback, exactly once.
+#include <atomic>
+#include <cstdio>
+#include <cstdlib>
+#include <functional>
+#include <map>
+
+#include "EngineTestUtil.h"
+#include "MmeJni.h"
+#include "Mvd.h"
+
+using namespace android;
+using namespace enginecase;
+using namespace std::chrono_literals;
+using hostbinder::RemoteBinder;
+
+namespace {
+
+constexpr auto kLoadTime = 1500ms;  // each thread starts rounds until then, at least one
+constexpr auto kPause = 1ms;        // between a thread's rounds, so no side swamps the log and call record
+constexpr auto kWatchdog = 60s;     // far beyond any round, also under TSan on a busy machine
+constexpr int kClients = 4;
+const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
+const std::string kSent = "BpVideoCallEngineCallback notifyCallback";
+
+// The load's threads. One still running when the watchdog runs out is
+// deadlocked: that is reported and the process ends rather than hang.
+class Load {
+public:
+    void run(std::function<void()> body) {
+        mThreads.emplace_back([this, body = std::move(body)] {
+            body();
+            ++mFinished;
+        });
+    }
+    void join() {
+        if (!eventually([&] { return mFinished == mThreads.size(); }, kWatchdog)) {
+            fprintf(stderr, "deadlock: %zu of %zu load threads still running\n", mThreads.size() - mFinished,
+                    mThreads.size());
+            std::abort();
+        }
+        for (std::thread& t : mThreads) t.join();
+    }
+
+private:
+    std::vector<std::thread> mThreads;
+    std::atomic<size_t> mFinished{0};
+};
+
+// One client thread's rounds, and the first answer other than int32 0 with status 0.
+struct Tally {
+    size_t rounds = 0;
+    std::string wrong;
+    void check(uint32_t code, std::initializer_list<int32_t> ints, const sp<IBinder>& binder = nullptr,
+               const char* text = nullptr) {
+        const enginetest::Reply r = enginetest::call(code, ints, binder, text);
+        if (wrong.empty() && (r.status != NO_ERROR || r.size != sizeof(int32_t) || r.value != 0)) {
+            wrong = "code " + std::to_string(code) + ": status " + std::to_string(r.status) + ", int32 " +
+                    std::to_string(r.value) + ", " + std::to_string(r.size) + " bytes";
+        }
+    }
+};
+
+size_t countOf(const std::string& function) {
+    const Strings names = hostfakes::callNames();
+    return static_cast<size_t>(std::count(names.begin(), names.end(), function));
+}
+
+class StressTest : public EngineCase {
+protected:
+    size_t lines(const char* tag, const std::string& text) const { return log.count(ANDROID_LOG_INFO, tag, text); }
+};
+
+}  // namespace
+
+TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
+    ASSERT_EQ(0, Mvd_EvntSetCallback(Mvd_EvntProc, 1));  // as the media engine's start-up does
+    const size_t opensBefore = countOf("Mvd_Open"), closesBefore = countOf("Mvd_Close");
+    const auto until = std::chrono::steady_clock::now() + kLoadTime;
+    auto loading = [&] {
+        std::this_thread::sleep_for(kPause);
+        return std::chrono::steady_clock::now() < until;
+    };
+    Load load;
+
+    Tally tallies[kClients];
+    sp<RemoteBinder> clients[kClients];
+    for (int i = 0; i < kClients; ++i) {
+        clients[i] = enginetest::remoteCallback();
+        load.run([&, i] {
+            Tally& t = tallies[i];
+            do {
+                t.check(kCameraId, {i % 2});
+                t.check(kCameraSize, {1 + i % 3});
+                t.check(kOrientation, {90 * i, i % 4, i % 2});
+                t.check(kUplinkQos, {300 + 200 * i + static_cast<int32_t>(t.rounds % 2)});
+                t.check(kSetSurface, {i % 2}, enginetest::remoteProducer());
+                t.check(kHideImage, {1}, nullptr, "/data/vce/hold.png");
+                t.check(kSetCallback, {}, clients[i]);
+                t.check(kHideImage, {0});
+                t.check(kCleanCallback, {});
+                t.check(kCleanSurface, {i % 2});
+                t.check(kCameraId, {-1});
+                ++t.rounds;
+            } while (loading());
+        });
+    }
+
+    // The modem waits for each start's bind request before it holds, resumes and ends the stream.
+    int starts = 0, binds = 0;
+    std::string badBind;
+    load.run([&] {
+        vtspcodec::StreamCommand c;
+        c.streamId = 1000;
+        c.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
+        auto write = [&](int32_t code, uint32_t dir) {
+            c.code = code;
+            c.dir = dir;
+            enginetest::modem().writeRecord(vtspcodec::streamRecord(c));
+        };
+        do {
+            ++c.streamId;
+            c.localAddr = vtspcodec::address("10.0.0.1", static_cast<uint16_t>(6000 + 2 * (c.streamId % 500)));
+            write(_VTSP_CMD_STREAM_VIDEO_START, VTSP_STREAM_DIR_SENDRECV);
+            ++starts;
+            VPR_Comm reply{};
+            const bool got = enginetest::modem().readRecord(&reply, 20s);
+            const vtspcodec::BindRequest bind = vtspcodec::readBindRequest(reply);
+            if (!got || bind.code != VPR_NET_CMD_BIND || bind.streamId != static_cast<int32_t>(c.streamId)) {
+                badBind = "stream " + std::to_string(c.streamId) + ": " +
+                          (got ? "code " + std::to_string(bind.code) + " for stream " + std::to_string(bind.streamId)
+                               : "no reply");
+                return;
+            }
+            ++binds;
+            write(_VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_STREAM_DIR_INACTIVE);
+            write(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV);
+            write(_VTSP_CMD_STREAM_VIDEO_END, VTSP_STREAM_DIR_SENDRECV);
+        } while (loading());
+    });
+
+    // The media engine's events (each on a new native thread) and the video library's.
+    int breaks = 0, recoveries = 0, sizes = 0, unhandledMvd = 0, unhandledZmf = 0;
+    load.run([&] {
+        do {
+            const int event = breaks == recoveries ? 22 : 23;
+            ++(event == 22 ? breaks : recoveries);
+            unhandledMvd += hostfakes::fireMvdEvent(tagMVD_EVNT{{event}}) != 0;
+        } while (loading());
+    });
+    load.run([&] {
+        do {
+            unhandledZmf += !hostfakes::fireZmfEvent(27, kRemoteSize);
+            ++sizes;
+        } while (loading());
+    });
+    load.join();
+
+    size_t rounds = 0;
+    for (int i = 0; i < kClients; ++i) {
+        EXPECT_EQ("", tallies[i].wrong) << "client " << i;
+        rounds += tallies[i].rounds;
+    }
+    // Each request reached the service once.
+    EXPECT_EQ(2 * rounds, lines(kServiceTag, "VCE_ACTION_SET_CAMERAID"));
+    EXPECT_EQ(rounds, lines(kServiceTag, "VCE_ACTION_SET_CALLBACK"));
+    EXPECT_EQ(rounds, lines(kServiceTag, "VCE_ACTION_CLEAN_CALLBACK"));
+    EXPECT_EQ(2 * rounds, lines(kServiceTag, "VCE_ACTION_HIDE_LOCAL_IMAGE"));
+
+    // One bind request per start and nothing else on the pipe; every stream opened and closed once.
+    EXPECT_EQ("", badBind);
+    EXPECT_EQ(starts, binds);
+    EXPECT_TRUE(enginetest::modem().silentFor(200ms));
+    EXPECT_EQ(static_cast<size_t>(starts), countOf("Mvd_Open") - opensBefore);
+    EXPECT_TRUE(eventually([&] { return countOf("Mvd_Close") - closesBefore == static_cast<size_t>(starts); }))
+            << starts << " streams started, " << countOf("Mvd_Close") - closesBefore << " closed";
+
+    // Every event reached the engine once, then the client (each transaction whole) or nobody.
+    EXPECT_EQ(0, unhandledMvd);
+    EXPECT_EQ(0, unhandledZmf);
+    EXPECT_EQ(static_cast<size_t>(breaks), lines(kEngineTag, "mmeEvtUpdate evt: 22"));
+    EXPECT_EQ(static_cast<size_t>(recoveries), lines(kEngineTag, "mmeEvtUpdate evt: 23"));
+    EXPECT_EQ(static_cast<size_t>(sizes), lines(kEngineTag, "zmfRenderEvtUpdate, evt:28 [Remote], type 0, [640x480]"));
+    const size_t sentBreaks = lines(kEngineTag, kSent + ", 14"), sentRecoveries = lines(kEngineTag, kSent + ", 15"),
+                 sentSizes = lines(kEngineTag, kSent + " with data, 11, 640, 480, 0");
+    std::map<std::string, size_t> delivered{
+            {"code 0 flags 0: 14", 0}, {"code 0 flags 0: 15", 0}, {"code 1 flags 0: 11 640 480 0", 0}};
+    for (const sp<RemoteBinder>& client : clients) {
+        for (const std::string& t : received(*client)) ++delivered[t];
+    }
+    EXPECT_EQ((std::map<std::string, size_t>{{"code 0 flags 0: 14", sentBreaks},
+                                             {"code 0 flags 0: 15", sentRecoveries},
+                                             {"code 1 flags 0: 11 640 480 0", sentSizes}}),
+              delivered);
+    EXPECT_EQ(static_cast<size_t>(breaks + recoveries + sizes),
+              sentBreaks + sentRecoveries + sentSizes + lines(kEngineTag, "notifyCallback null"));
+
+    send(kCleanCallback);
+    send(kRelease);
+}
