@@ -57,11 +57,13 @@ double secondsSince(Clock::time_point start) {
     return std::chrono::duration<double>(Clock::now() - start).count();
 }
 
-bool writeWhole(int fd, const VPR_Comm& record) {
-    const char* p = reinterpret_cast<const char*>(&record);
-    size_t left = sizeof(record);
+// One whole record through `io` (read or write), across short transfers and
+// interruptions; false when the pipe fails or ends.
+template <typename Io, typename Byte>
+bool transferWhole(Io io, int fd, Byte* p) {
+    size_t left = sizeof(VPR_Comm);
     while (left > 0) {
-        const ssize_t n = write(fd, p, left);
+        const ssize_t n = io(fd, p, left);
         if (n < 0 && errno == EINTR) continue;
         if (n <= 0) return false;
         p += n;
@@ -70,17 +72,12 @@ bool writeWhole(int fd, const VPR_Comm& record) {
     return true;
 }
 
+bool writeWhole(int fd, const VPR_Comm& record) {
+    return transferWhole(::write, fd, reinterpret_cast<const char*>(&record));
+}
+
 bool readWhole(int fd, VPR_Comm* record) {
-    char* p = reinterpret_cast<char*>(record);
-    size_t left = sizeof(*record);
-    while (left > 0) {
-        const ssize_t n = read(fd, p, left);
-        if (n < 0 && errno == EINTR) continue;
-        if (n <= 0) return false;
-        p += n;
-        left -= static_cast<size_t>(n);
-    }
-    return true;
+    return transferWhole(::read, fd, reinterpret_cast<char*>(record));
 }
 
 void die(const char* what) {
