@@ -182,6 +182,12 @@ std::vector<std::string> callNames() {
 
 size_t callCount() { return calls().size(); }
 
+size_t callCount(const std::string& function) {
+    size_t n = 0;
+    for (const Call& call : calls()) n += call.name == function;
+    return n;
+}
+
 void setResult(const std::string& function, int result) {
     CallRecorder::instance().setResult(function, result);
 }

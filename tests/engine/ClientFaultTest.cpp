@@ -3,16 +3,14 @@
 // library is slow to take renders away while the client sets new surfaces
 // and releases. A callback dead before it is set, and a callback change during
 // a notification, are CallbackTest's part.
-#include <atomic>
 #include <condition_variable>
-#include <cstdio>
-#include <cstdlib>
 #include <future>
 #include <mutex>
 
 #include "EngineTestUtil.h"
 #include "MmeJni.h"
 #include "Mvd.h"
+#include "WatchedThreads.h"
 
 using namespace android;
 using namespace enginecase;
@@ -35,29 +33,16 @@ protected:
     }
     void TearDown() override {
         openGate();
-        if (!eventually([&] { return mFinished == mThreads.size(); }, kWatchdog)) {
-            fprintf(stderr, "deadlock: %zu of %zu threads still running\n", mThreads.size() - mFinished,
-                    mThreads.size());
-            std::abort();
-        }
-        for (std::thread& t : mThreads) t.join();
+        mThreads.join();
         send(kCleanCallback);  // no later case reaches a gated handler
         EngineCase::TearDown();
     }
 
     // Runs `body` on a thread of its own: a media library's, or another binder thread.
     template <typename Body>
-    std::future<decltype(std::declval<Body>()())> onThread(Body body) {
-        std::packaged_task<decltype(body())()> task(std::move(body));
-        auto result = task.get_future();
-        mThreads.emplace_back([this, task = std::move(task)]() mutable {
-            task();
-            ++mFinished;
-        });
-        return result;
-    }
+    auto onThread(Body body) { return mThreads.run(std::move(body)); }
     template <typename T>
-    static bool finishes(std::future<T>& f) { return f.wait_for(kWatchdog) == std::future_status::ready; }
+    bool finishes(std::future<T>& f) const { return mThreads.finishes(f); }
 
     // A client whose handler stays inside the transaction until the gate
     // opens: a client busy in its handler, or whose process dies meanwhile.
@@ -97,8 +82,7 @@ protected:
     int mInside = 0, mMostInside = 0;
 
 private:
-    std::vector<std::thread> mThreads;
-    std::atomic<size_t> mFinished{0};
+    WatchedThreads mThreads{kWatchdog};
 };
 
 }  // namespace

@@ -240,11 +240,7 @@ protected:
     LogCapture log;
 
 private:
-    static size_t completedRemoves() {
-        size_t n = 0;
-        for (const std::string& name : hostfakes::callNames()) n += name == "renderRemove";
-        return n;
-    }
+    static size_t completedRemoves() { return hostfakes::callCount("renderRemove"); }
 
     size_t mMark = 0;
     size_t mRemovesBase = 0;

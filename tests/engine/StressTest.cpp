@@ -5,14 +5,12 @@
 // every stream start get exactly one bind request, and every event reach the
 // client, or be dropped for want of a callback, exactly once.
 #include <atomic>
-#include <cstdio>
-#include <cstdlib>
-#include <functional>
 #include <map>
 
 #include "EngineTestUtil.h"
 #include "MmeJni.h"
 #include "Mvd.h"
+#include "WatchedThreads.h"
 
 using namespace android;
 using namespace enginecase;
@@ -28,30 +26,6 @@ constexpr int kClients = 4;
 const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 const std::string kSent = "BpVideoCallEngineCallback notifyCallback";
 
-// The load's threads. One still running when the watchdog runs out is
-// deadlocked: that is reported and the process ends rather than hang.
-class Load {
-public:
-    void run(std::function<void()> body) {
-        mThreads.emplace_back([this, body = std::move(body)] {
-            body();
-            ++mFinished;
-        });
-    }
-    void join() {
-        if (!eventually([&] { return mFinished == mThreads.size(); }, kWatchdog)) {
-            fprintf(stderr, "deadlock: %zu of %zu load threads still running\n", mThreads.size() - mFinished,
-                    mThreads.size());
-            std::abort();
-        }
-        for (std::thread& t : mThreads) t.join();
-    }
-
-private:
-    std::vector<std::thread> mThreads;
-    std::atomic<size_t> mFinished{0};
-};
-
 // One client thread's rounds, and the first answer other than int32 0 with status 0.
 struct Tally {
     size_t rounds = 0;
@@ -66,11 +40,6 @@ struct Tally {
     }
 };
 
-size_t countOf(const std::string& function) {
-    const Strings names = hostfakes::callNames();
-    return static_cast<size_t>(std::count(names.begin(), names.end(), function));
-}
-
 class StressTest : public EngineCase {
 protected:
     size_t lines(const char* tag, const std::string& text) const { return log.count(ANDROID_LOG_INFO, tag, text); }
@@ -80,13 +49,13 @@ protected:
 
 TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
     ASSERT_EQ(0, Mvd_EvntSetCallback(Mvd_EvntProc, 1));  // as the media engine's start-up does
-    const size_t opensBefore = countOf("Mvd_Open"), closesBefore = countOf("Mvd_Close");
+    const size_t opensBefore = hostfakes::callCount("Mvd_Open"), closesBefore = hostfakes::callCount("Mvd_Close");
     const auto until = std::chrono::steady_clock::now() + kLoadTime;
     auto loading = [&] {
         std::this_thread::sleep_for(kPause);
         return std::chrono::steady_clock::now() < until;
     };
-    Load load;
+    WatchedThreads load(kWatchdog);
 
     Tally tallies[kClients];
     sp<RemoteBinder> clients[kClients];
@@ -176,9 +145,9 @@ TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
     EXPECT_EQ("", badBind);
     EXPECT_EQ(starts, binds);
     EXPECT_TRUE(enginetest::modem().silentFor(200ms));
-    EXPECT_EQ(static_cast<size_t>(starts), countOf("Mvd_Open") - opensBefore);
-    EXPECT_TRUE(eventually([&] { return countOf("Mvd_Close") - closesBefore == static_cast<size_t>(starts); }))
-            << starts << " streams started, " << countOf("Mvd_Close") - closesBefore << " closed";
+    EXPECT_EQ(static_cast<size_t>(starts), hostfakes::callCount("Mvd_Open") - opensBefore);
+    EXPECT_TRUE(eventually([&] { return hostfakes::callCount("Mvd_Close") - closesBefore == static_cast<size_t>(starts); }))
+            << starts << " streams started, " << hostfakes::callCount("Mvd_Close") - closesBefore << " closed";
 
     // Every event reached the engine once, then the client (each transaction whole) or nobody.
     EXPECT_EQ(0, unhandledMvd);

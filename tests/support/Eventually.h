@@ -16,4 +16,11 @@ bool eventually(Pred pred, std::chrono::milliseconds timeout = std::chrono::seco
     return true;
 }
 
+// Milliseconds since `start`: for the few checks that a call is woken rather
+// than left to wait out a pause.
+inline long long msSince(std::chrono::steady_clock::time_point start) {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(std::chrono::steady_clock::now() - start)
+            .count();
+}
+
 #endif  // QUELLBORN_TESTS_EVENTUALLY_H

@@ -19,6 +19,7 @@
 #include <thread>
 #include <vector>
 
+#include "Eventually.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
 #include "ModemPty.h"
@@ -36,21 +37,12 @@ const char* const kTag = "VTSPManager";
 const char* const kRefused = "pushAndSignal: failed to push elem";
 const char* const kRecvPrefix = "cmdRxFunc, recv msg ";
 
-long long msSince(Clock::time_point t) {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - t).count();
-}
-
 StreamCommand startCommand(uint32_t streamId) {
     StreamCommand c;
     c.streamId = streamId;
     c.localAddr = address("10.0.0.1", static_cast<uint16_t>(6000 + 2 * streamId));
     c.remoteAddr = address("192.168.1.2", 5000);
     return c;
-}
-
-size_t mvdOpens() {
-    const std::vector<std::string> names = hostfakes::callNames();
-    return static_cast<size_t>(std::count(names.begin(), names.end(), "Mvd_Open"));
 }
 
 class VtspFaultTest : public ::testing::Test {
@@ -116,7 +108,7 @@ TEST_F(VtspFaultTest, RecordArrivingOneByteAtATimeIsHandledOnce) {
     EXPECT_EQ(range(7, 7), readBinds(1));
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(1u, recvLines());
-    EXPECT_EQ(1u, mvdOpens());
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
     EXPECT_NE(nullptr, link.mCmdCallback->stream(7));
 }
 
@@ -144,7 +136,7 @@ TEST_F(VtspFaultTest, Sigusr1StormLosesAndRepeatsNothing) {
     EXPECT_EQ(range(1, kRecords), ids);
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(static_cast<size_t>(kRecords), recvLines());
-    EXPECT_EQ(static_cast<size_t>(kRecords), mvdOpens());
+    EXPECT_EQ(static_cast<size_t>(kRecords), hostfakes::callCount("Mvd_Open"));
     EXPECT_EQ(static_cast<size_t>(kRecords), link.mCmdCallback->streamCount());
 }
 
@@ -168,7 +160,7 @@ TEST_F(VtspFaultTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
     ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
     EXPECT_EQ(range(5, 5), readBinds(1));
     EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(1u, mvdOpens());
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
 
     // Failing again, destroy still returns promptly.
     ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
@@ -205,7 +197,7 @@ TEST_F(VtspFaultTest, FailedReadIsRetriedAfterAPauseAndResumes) {
     pty.writeRecord(streamRecord(startCommand(12)));
     EXPECT_EQ(range(11, 12), readBinds(2));
     EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(3u, mvdOpens());
+    EXPECT_EQ(3u, hostfakes::callCount("Mvd_Open"));
     EXPECT_EQ(3u, recvLines());
     close(writeOnly);
     close(readWrite);
@@ -232,7 +224,7 @@ TEST_F(VtspFaultTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(refused, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
     EXPECT_EQ(2 * refused + 1, recvLines());
-    EXPECT_EQ(refused + 1, mvdOpens());
+    EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
     for (int cycle = 0; cycle < 3; ++cycle) {
         for (int i = 0; i < kPerPhase; ++i) {
             EXPECT_NE(nullptr, link.mCmdCallback->stream(100 * cycle + 1 + i));

@@ -67,10 +67,6 @@ bool linkThreads(size_t count, bool sleepingOnly = false) {
     return true;
 }
 
-long long msSince(Clock::time_point t) {
-    return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - t).count();
-}
-
 // Waits until the media engine has been asked `text`.
 bool called(const std::string& text) {
     return eventually([&] {
@@ -173,8 +169,7 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     // a body is turned and composed is CmdBufferTest's business.
     EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
     EXPECT_EQ((V{recvLine(1, 0), kWritten}), linkLines());
-    const V names = hostfakes::callNames();
-    EXPECT_EQ(1, std::count(names.begin(), names.end(), "Mvd_Open"));
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
     EXPECT_TRUE(called("Mvd_ProcStart(1) = 0"));
 
     // Each later kind of command reaches the stream: RTCP feedback, a hold, the end.
@@ -217,8 +212,7 @@ TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
                  recvLine(5, 0), kWritten}),
               linkLines());
     for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
-    const V names = hostfakes::callNames();
-    EXPECT_EQ(1, std::count(names.begin(), names.end(), "Mvd_Open"));
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
     EXPECT_EQ("Mvd_Open(\"10.0.0.9\", 6010, out=1) = 0", hostfakes::callTexts().at(0));
 }
 

@@ -32,6 +32,8 @@ std::vector<std::string> callNames();
 // Calls recorded since position `from` (as text).
 std::vector<std::string> callTextsSince(size_t from);
 size_t callCount();
+// How many recorded calls went to `function`.
+size_t callCount(const std::string& function);
 
 // Keeps each call in the record (the default) or lets it pass unkept (the
 // trace still sees it). Long benchmarks switch keeping off so that the
