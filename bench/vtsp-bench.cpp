@@ -204,20 +204,35 @@ private:
     android::VtspManager mLink;
 };
 
+// Heap bytes added since `before` (heapInUse), shared out over `items`.
+long long heapPerItemSince(size_t before, size_t items) {
+    const long long added = static_cast<long long>(processusage::heapInUse()) - static_cast<long long>(before);
+    return added / static_cast<long long>(items);
+}
+
 // CPU time each link thread spent per command over a stretch of work, in
 // microseconds, by thread name: where the link's own share of the time goes.
 using CpuPerCommand = std::map<std::string, double>;
 
-class ThreadCpuMeter {
+class LinkThreadMeter {
 public:
-    ThreadCpuMeter() : mBefore(processusage::threadsNamed(kLinkThreadPrefix)) {}
-    CpuPerCommand perCommand(size_t commands) const {
-        CpuPerCommand out;
+    LinkThreadMeter() : mBefore(processusage::threadsNamed(kLinkThreadPrefix)) {}
+
+    // What each link thread used since the meter was made, by name.
+    std::map<std::string, processusage::ThreadUsage> used() const {
+        std::map<std::string, processusage::ThreadUsage> out;
         for (const auto& [name, after] : processusage::threadsNamed(kLinkThreadPrefix)) {
             const auto before = mBefore.find(name);
             if (before == mBefore.end()) continue;
-            out[name] = static_cast<double>(after.cpuNs - before->second.cpuNs) / 1000.0 /
-                        static_cast<double>(commands);
+            out[name] = {after.cpuNs - before->second.cpuNs, after.wakeups - before->second.wakeups};
+        }
+        return out;
+    }
+
+    CpuPerCommand perCommand(size_t commands) const {
+        CpuPerCommand out;
+        for (const auto& [name, usage] : used()) {
+            out[name] = static_cast<double>(usage.cpuNs) / 1000.0 / static_cast<double>(commands);
         }
         return out;
     }
@@ -246,7 +261,7 @@ LinkFigures measureLink(ModemPty& pty, const Options& o) {
     LinkFigures f;
     f.pipe.latency.reserve(o.latencyRounds);
     const size_t heapBefore = processusage::heapInUse();
-    const ThreadCpuMeter startCpu;
+    const LinkThreadMeter startCpu;
     for (size_t i = 0; i < o.latencyRounds; ++i) {
         const VPR_Comm start = startRecord(id++);
         const auto t0 = Clock::now();
@@ -254,9 +269,8 @@ LinkFigures measureLink(ModemPty& pty, const Options& o) {
         f.pipe.latency.add(Clock::now() - t0);
     }
     f.cpuPerStart = startCpu.perCommand(o.latencyRounds);
-    f.heapPerStream = (static_cast<long long>(processusage::heapInUse()) - static_cast<long long>(heapBefore)) /
-                      static_cast<long long>(o.latencyRounds);
-    const ThreadCpuMeter modifyCpu;
+    f.heapPerStream = heapPerItemSince(heapBefore, o.latencyRounds);
+    const LinkThreadMeter modifyCpu;
     f.pipe.recordsPerSecond =
             pushThrough(master, modifyRecord(kFirstStreamId), o.throughputRecords, startRecord(id++), 1);
     f.cpuPerModify = modifyCpu.perCommand(o.throughputRecords);
@@ -269,8 +283,7 @@ long long fakeEngineHeapPerStream(size_t streams) {
     std::vector<unsigned int> ids(streams);
     const size_t before = processusage::heapInUse();
     for (unsigned int& id : ids) Mvd_Open("10.0.0.1", 6000, &id);
-    const long long per = (static_cast<long long>(processusage::heapInUse()) - static_cast<long long>(before)) /
-                          static_cast<long long>(streams);
+    const long long per = heapPerItemSince(before, streams);
     for (unsigned int id : ids) Mvd_Close(id);
     return per;
 }
@@ -282,8 +295,7 @@ long long heapPerQueuedCommand(size_t commands) {
     queue.start();
     const size_t before = processusage::heapInUse();
     for (size_t i = 0; i < commands; ++i) queue.pushAndSignal(android::CmdBuffer::fromRecord(record));
-    const long long per = (static_cast<long long>(processusage::heapInUse()) - static_cast<long long>(before)) /
-                          static_cast<long long>(commands);
+    const long long per = heapPerItemSince(before, commands);
     queue.destroy();
     return per;
 }
@@ -341,18 +353,16 @@ IdleFigures measureIdle(ModemPty& pty, const Options& o) {
     ScopedLink link(pty.devicePath());
     // Let the three threads reach the calls they block in.
     std::this_thread::sleep_for(std::chrono::milliseconds(200));
-    const auto threadsBefore = processusage::threadsNamed(kLinkThreadPrefix);
+    const LinkThreadMeter threads;
     const long long cpuBefore = processusage::processCpuNs();
     const auto start = Clock::now();
     std::this_thread::sleep_for(std::chrono::seconds(o.idleSeconds));
     IdleFigures f;
     f.seconds = secondsSince(start);
     f.processCpuNs = processusage::processCpuNs() - cpuBefore;
-    for (const auto& [name, after] : processusage::threadsNamed(kLinkThreadPrefix)) {
-        const auto before = threadsBefore.find(name);
-        if (before == threadsBefore.end()) continue;
-        f.linkCpuNs += after.cpuNs - before->second.cpuNs;
-        f.linkWakeups += after.wakeups - before->second.wakeups;
+    for (const auto& [name, usage] : threads.used()) {
+        f.linkCpuNs += usage.cpuNs;
+        f.linkWakeups += usage.wakeups;
         ++f.linkThreads;
     }
     return f;
