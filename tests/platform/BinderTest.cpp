@@ -1,11 +1,19 @@
 // Local binders in one process: BBinder's defaults, the dispatch of transact
-// to onTransact, attached objects, and IInterface::asBinder.
+// to onTransact, the dump transaction and the caller's identity, attached
+// objects, and IInterface::asBinder.
 #include <binder/Binder.h>
 #include <binder/IInterface.h>
+#include <binder/IPCThreadState.h>
 #include <binder/Parcel.h>
+#include <binder/PermissionCache.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
+#include <utils/String8.h>
 
+#include <string>
 #include <vector>
+
+#include "HostBinder.h"
 
 using namespace android;
 
@@ -25,6 +33,34 @@ protected:
         return NO_ERROR;
     }
 };
+
+// Writes what reached dump, and who asked, to the descriptor it was given.
+class DumpingBinder : public BBinder {
+public:
+    status_t dump(int fd, const Vector<String16>& args) override {
+        const IPCThreadState* ipc = IPCThreadState::self();
+        std::string text = std::to_string(ipc->getCallingPid()) + "/" + std::to_string(ipc->getCallingUid());
+        for (const String16& arg : args) text += " " + std::string(String8(arg).string());
+        text += PermissionCache::checkCallingPermission(String16("android.permission.DUMP")) ? " granted" : " denied";
+        return write(fd, text.data(), text.size()) == static_cast<ssize_t>(text.size()) ? NO_ERROR : -errno;
+    }
+};
+
+// Sends the dump transaction as a client's libbinder does and answers what
+// the binder wrote.
+std::string dumpOf(const sp<IBinder>& binder, std::vector<const char*> args) {
+    FILE* out = tmpfile();
+    Parcel data;
+    data.writeFileDescriptor(fileno(out));
+    data.writeInt32(static_cast<int32_t>(args.size()));
+    for (const char* arg : args) data.writeString16(String16(arg));
+    Parcel reply;
+    const status_t status = binder->transact(IBinder::DUMP_TRANSACTION, data, &reply);
+    std::string text(256, '\0');
+    text.resize(pread(fileno(out), &text[0], text.size(), 0));
+    fclose(out);
+    return std::to_string(status) + ": " + text;
+}
 
 class NoDeath : public IBinder::DeathRecipient {
     void binderDied(const wp<IBinder>&) override {}
@@ -72,6 +108,26 @@ TEST(BBinder, TransactDispatchesFromTheStartOfBothParcelsPingsAndDescribes) {
     // One-way calls have no reply parcel.
     EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(7, data, nullptr, IBinder::FLAG_ONEWAY));
     EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, nullptr));
+}
+
+// The permission controller's answers and the caller's identity come from
+// the control API; calls within the process carry its own identity.
+TEST(BBinder, DumpTransactionReachesDumpWithTheCallersIdentity) {
+    sp<IBinder> binder = new DumpingBinder();
+    const std::string self = std::to_string(getpid()) + "/" + std::to_string(getuid());
+    EXPECT_EQ("0: " + self + " --link -h granted", dumpOf(binder, {"--link", "-h"}));
+    hostbinder::setClientIdentity(4242, 2000);
+    EXPECT_EQ("0: 4242/2000 denied", dumpOf(binder, {}));
+    hostbinder::setPermission("android.permission.DUMP", 2000, true);
+    EXPECT_EQ("0: 4242/2000 granted", dumpOf(binder, {}));
+    hostbinder::clearPermissions();
+    hostbinder::setClientIdentity(4242, 0);  // root needs no grant
+    EXPECT_EQ("0: 4242/0 granted", dumpOf(binder, {}));
+    hostbinder::clearClientIdentity();
+    EXPECT_EQ(getpid(), IPCThreadState::self()->getCallingPid());  // outside a transaction
+    EXPECT_EQ("0: " + self + " granted", dumpOf(binder, {}));
+    // A BBinder that does not dump writes nothing.
+    EXPECT_EQ("0: ", dumpOf(new BBinder(), {"-a"}));
 }
 
 TEST(BBinder, AttachedObjectsAreFoundDetachedAndCleanedUpWithTheBinder) {

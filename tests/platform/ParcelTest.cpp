@@ -1,8 +1,10 @@
 // The host Parcel: layout and alignment, reads at and past the end, strings,
-// and binders carried (and kept alive) by a parcel.
+// and binders and file descriptors carried (and kept alive) by a parcel.
 #include <binder/Binder.h>
 #include <binder/Parcel.h>
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <unistd.h>
 #include <utils/String8.h>
 
 #include <cstring>
@@ -212,4 +214,40 @@ TEST(Parcel, BindersAreReadOnlyFromTheParcelsOwnRecords) {
     EXPECT_EQ(nullptr, real.readInplace(8));
     Parcel empty;
     EXPECT_EQ(nullptr, empty.readStrongBinder());
+}
+
+// A descriptor arrives as the driver delivers it: a duplicate of the
+// sender's that the parcel owns and closes, never the sender's own.
+TEST(Parcel, FileDescriptorsArriveAsDuplicatesThatLiveAsLongAsTheParcel) {
+    int pipeFds[2];
+    ASSERT_EQ(0, pipe(pipeFds));
+    int carried = -1;
+    {
+        Parcel p;
+        EXPECT_EQ(BAD_VALUE, p.writeFileDescriptor(-1));
+        ASSERT_EQ(NO_ERROR, p.writeFileDescriptor(pipeFds[1]));
+        ASSERT_EQ(NO_ERROR, p.writeDupFileDescriptor(pipeFds[1]));
+        p.writeStrongBinder(new BBinder());
+        EXPECT_TRUE(p.hasFileDescriptors());
+        EXPECT_EQ(3u, p.objectsCount());
+        p.setDataPosition(0);
+        carried = p.readFileDescriptor();
+        ASSERT_GE(carried, 0);
+        EXPECT_NE(pipeFds[1], carried);
+        EXPECT_GE(p.readFileDescriptor(), 0);
+        EXPECT_EQ(BAD_TYPE, p.readFileDescriptor());  // a binder is not a descriptor
+        ASSERT_EQ(1, write(carried, "x", 1));
+        char byte = 0;
+        ASSERT_EQ(1, read(pipeFds[0], &byte, 1));
+        EXPECT_EQ('x', byte);
+
+        Parcel copy;  // bytes copied out carry no descriptor
+        copy.setData(p.data(), p.dataSize());
+        EXPECT_FALSE(copy.hasFileDescriptors());
+        EXPECT_EQ(BAD_TYPE, copy.readFileDescriptor());
+    }
+    EXPECT_EQ(-1, fcntl(carried, F_GETFD));  // closed with the parcel
+    EXPECT_EQ(1, write(pipeFds[1], "y", 1));  // the sender's stays open
+    close(pipeFds[0]);
+    close(pipeFds[1]);
 }

@@ -3,12 +3,16 @@
 // code in the same process.
 #include <binder/Binder.h>
 #include <binder/IInterface.h>
+#include <binder/IPCThreadState.h>
 #include <binder/Parcel.h>
+#include <utils/Vector.h>
 
 #include <unistd.h>
 
 #include <map>
 #include <mutex>
+
+#include "HostBinder.h"
 
 namespace android {
 
@@ -56,6 +60,35 @@ status_t IBinder::getDebugPid(pid_t* outPid) {
 
 // ---------------------------------------------------------------------------
 // BBinder
+
+namespace {
+
+// Puts the identity of the thread's client (hostbinder::setClientIdentity)
+// in the thread's calling identity for one transaction.
+class CallingIdentityScope {
+public:
+    CallingIdentityScope() {
+        pid_t pid = 0;
+        uid_t uid = 0;
+        mActive = hostbinder::clientIdentity(&pid, &uid);
+        if (!mActive) return;
+        IPCThreadState* ipc = IPCThreadState::self();
+        mSaved = ipc->clearCallingIdentity();
+        ipc->restoreCallingIdentity(static_cast<int64_t>((static_cast<uint64_t>(uid) << 32) |
+                                                         static_cast<uint32_t>(pid)));
+    }
+    ~CallingIdentityScope() {
+        if (mActive) IPCThreadState::self()->restoreCallingIdentity(mSaved);
+    }
+    CallingIdentityScope(const CallingIdentityScope&) = delete;
+    CallingIdentityScope& operator=(const CallingIdentityScope&) = delete;
+
+private:
+    bool mActive = false;
+    int64_t mSaved = 0;
+};
+
+}  // namespace
 
 class BBinder::Extras {
 public:
@@ -105,6 +138,9 @@ status_t BBinder::dump(int /*fd*/, const Vector<String16>& /*args*/) { return NO
 status_t BBinder::transact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) {
     // In one process the caller's own parcel arrives: read it from the start.
     data.setDataPosition(0);
+    // A thread that plays a client process calls with that process's
+    // identity, as the driver reports the sender; ours comes back after.
+    CallingIdentityScope caller;
     status_t err = NO_ERROR;
     switch (code) {
         case PING_TRANSACTION:
@@ -125,8 +161,16 @@ status_t BBinder::transact(uint32_t code, const Parcel& data, Parcel* reply, uin
     return err;
 }
 
-status_t BBinder::onTransact(uint32_t code, const Parcel& /*data*/, Parcel* reply, uint32_t /*flags*/) {
+status_t BBinder::onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t /*flags*/) {
     switch (code) {
+        case DUMP_TRANSACTION: {
+            // The descriptor stays the parcel's: dump writes to it and leaves it open.
+            const int fd = data.readFileDescriptor();
+            const int32_t argc = data.readInt32();
+            Vector<String16> args;
+            for (int32_t i = 0; i < argc && data.dataAvail() > 0; ++i) args.add(data.readString16());
+            return dump(fd, args);
+        }
         case INTERFACE_TRANSACTION:
             if (reply != nullptr) reply->writeString16(getInterfaceDescriptor());
             return NO_ERROR;

@@ -2,18 +2,27 @@
 //
 // The byte layout is libbinder's: every item is padded to four bytes with
 // zeros, strings are length-prefixed or NUL-terminated as there, and a binder
-// is a 24-byte flat_binder_object record. With no driver to translate and
-// count references, the parcel keeps every binder it carries alive itself:
-// mObjects holds one pair of words per binder (the offset of its record, its
-// address), the parcel owns one strong reference per pair, and a binder is
-// only ever read back from that table, never from the bytes. Bytes copied out
-// of a parcel (setData) therefore carry no binder and cannot forge a pointer.
+// or a file descriptor is a 24-byte flat_binder_object record. With no driver
+// to translate and count references, the parcel keeps every object it carries
+// alive itself: mObjects holds three words per object (the offset of its
+// record, the binder's address or the descriptor, the kind), the parcel owns
+// one strong reference per binder and each descriptor it holds, and an object
+// is only ever read back from that table, never from the bytes. Bytes copied
+// out of a parcel (setData) therefore carry no object and cannot forge one.
+//
+// A descriptor is duplicated when it is written, unless the parcel is given
+// it to own: the receiving side of a driver gets a descriptor of its own that
+// lives as long as the parcel, and so does the reader here.
 #include <binder/Parcel.h>
 
 #include <log/log.h>
 #include <utils/String8.h>
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <algorithm>
+#include <cerrno>
 #include <cstdlib>
 #include <cstring>
 
@@ -32,14 +41,17 @@ namespace {
 
 constexpr uint32_t kTypeBinder = B_PACK_CHARS('s', 'b', '*', 0x85);
 constexpr uint32_t kTypeHandle = B_PACK_CHARS('s', 'h', '*', 0x85);
+constexpr uint32_t kTypeFd = B_PACK_CHARS('f', 'd', '*', 0x85);
 // FLAT_BINDER_FLAG_ACCEPTS_FDS with the lowest scheduling priority, as a
 // local binder is written on a device.
 constexpr uint32_t kLocalBinderFlags = 0x100 | 0x7f;
 
 constexpr size_t kMaxSize = INT32_MAX;
 constexpr size_t kRecordSize = sizeof(flat_binder_object);
-// mObjects words per carried binder: [offset of the record, IBinder*].
-constexpr size_t kObjectWords = 2;
+// mObjects words per carried object: [offset of the record, IBinder* or
+// descriptor, kind].
+constexpr size_t kObjectWords = 3;
+enum ObjectKind : binder_size_t { kBinderObject = 0, kFdObject = 1 };
 
 // Written in front of an interface token, as libbinder of this header's
 // release does: the strict-mode policy with PENALTY_GATHER, then the unset
@@ -48,6 +60,15 @@ constexpr int32_t kStrictModePenaltyGather = INT32_MIN;
 constexpr int32_t kUnsetWorkSource = -1;
 
 size_t padSize(size_t s) { return (s + 3) & ~size_t(3); }
+
+// Gives back what the parcel held for one table entry.
+void releaseObject(const binder_size_t* entry, const void* owner) {
+    if (entry[2] == kFdObject) {
+        close(static_cast<int>(entry[1]));
+    } else {
+        reinterpret_cast<IBinder*>(entry[1])->decStrong(owner);
+    }
+}
 
 }  // namespace
 
@@ -81,9 +102,7 @@ void Parcel::releaseObjects() {
     // may itself free parcels, and must not find this one half released.
     const size_t count = mObjectsSize;
     mObjectsSize = 0;
-    for (size_t i = 0; i < count; ++i) {
-        reinterpret_cast<IBinder*>(mObjects[i * kObjectWords + 1])->decStrong(this);
-    }
+    for (size_t i = 0; i < count; ++i) releaseObject(mObjects + i * kObjectWords, this);
 }
 
 void Parcel::freeDataNoInit() {
@@ -127,7 +146,7 @@ status_t Parcel::continueWrite(size_t desired) {
             std::copy(entry, entry + kObjectWords, mObjects + kept * kObjectWords);
             ++kept;
         } else {
-            reinterpret_cast<IBinder*>(entry[1])->decStrong(this);
+            releaseObject(entry, this);
         }
     }
     mObjectsSize = kept;
@@ -401,44 +420,55 @@ bool Parcel::checkInterface(IBinder* binder) const {
     return binder != nullptr && enforceInterface(binder->getInterfaceDescriptor());
 }
 
-status_t Parcel::flattenBinder(const sp<IBinder>& binder) {
-    flat_binder_object record{};
-    record.type = kTypeBinder;
-    if (binder != nullptr) {
-        const bool local = binder->localBinder() != nullptr;
-        record.type = local ? kTypeBinder : kTypeHandle;
-        record.flags = local ? kLocalBinderFlags : 0;
-        record.binder = reinterpret_cast<uintptr_t>(binder.get());
-        record.cookie = record.binder;
-        // Make room in the table first, so a failure leaves no record behind.
-        if (mObjectsSize == mObjectsCapacity) {
-            const size_t capacity = mObjectsCapacity * 2 + 4;
-            auto* objects = static_cast<binder_size_t*>(
-                    realloc(mObjects, capacity * kObjectWords * sizeof(binder_size_t)));
-            if (objects == nullptr) return NO_MEMORY;
-            mObjects = objects;
-            mObjectsCapacity = capacity;
-        }
+// Writes an object record at the position and enters it in the table; a
+// record written over an earlier one replaces it there. On failure nothing
+// is kept and the caller still holds what it gave.
+static status_t writeObjectRecord(Parcel* parcel, binder_size_t** objects, size_t* size,
+                                  size_t* capacity, const flat_binder_object& record,
+                                  binder_size_t value, ObjectKind kind) {
+    // Make room in the table first, so a failure leaves no record behind.
+    if (*size == *capacity) {
+        const size_t grown = *capacity * 2 + 4;
+        auto* table = static_cast<binder_size_t*>(realloc(*objects, grown * kObjectWords * sizeof(binder_size_t)));
+        if (table == nullptr) return NO_MEMORY;
+        *objects = table;
+        *capacity = grown;
     }
-    const size_t offset = mDataPos;
-    status_t err = write(&record, sizeof(record));
-    // As on a device, a null binder is a record of zeros outside the table.
-    if (err != NO_ERROR || binder == nullptr) return err;
-
-    binder->incStrong(this);
-    for (size_t i = 0; i < mObjectsSize; ++i) {
-        binder_size_t* entry = mObjects + i * kObjectWords;
+    const size_t offset = parcel->dataPosition();
+    status_t err = parcel->write(&record, sizeof(record));
+    if (err != NO_ERROR) return err;
+    for (size_t i = 0; i < *size; ++i) {
+        binder_size_t* entry = *objects + i * kObjectWords;
         if (entry[0] == offset) {  // the record was written over
-            reinterpret_cast<IBinder*>(entry[1])->decStrong(this);
-            entry[1] = reinterpret_cast<uintptr_t>(binder.get());
+            releaseObject(entry, parcel);
+            entry[1] = value;
+            entry[2] = kind;
             return NO_ERROR;
         }
     }
-    binder_size_t* entry = mObjects + mObjectsSize * kObjectWords;
+    binder_size_t* entry = *objects + *size * kObjectWords;
     entry[0] = offset;
-    entry[1] = reinterpret_cast<uintptr_t>(binder.get());
-    ++mObjectsSize;
+    entry[1] = value;
+    entry[2] = kind;
+    ++*size;
     return NO_ERROR;
+}
+
+status_t Parcel::flattenBinder(const sp<IBinder>& binder) {
+    flat_binder_object record{};
+    record.type = kTypeBinder;
+    // As on a device, a null binder is a record of zeros outside the table.
+    if (binder == nullptr) return write(&record, sizeof(record));
+    const bool local = binder->localBinder() != nullptr;
+    record.type = local ? kTypeBinder : kTypeHandle;
+    record.flags = local ? kLocalBinderFlags : 0;
+    record.binder = reinterpret_cast<uintptr_t>(binder.get());
+    record.cookie = record.binder;
+    binder->incStrong(this);
+    status_t err = writeObjectRecord(this, &mObjects, &mObjectsSize, &mObjectsCapacity, record,
+                                     reinterpret_cast<uintptr_t>(binder.get()), kBinderObject);
+    if (err != NO_ERROR) binder->decStrong(this);
+    return err;
 }
 
 status_t Parcel::unflattenBinder(sp<IBinder>* out) const {
@@ -450,6 +480,7 @@ status_t Parcel::unflattenBinder(sp<IBinder>* out) const {
     for (size_t i = 0; i < mObjectsSize; ++i) {
         const binder_size_t* entry = mObjects + i * kObjectWords;
         if (entry[0] == offset) {
+            if (entry[2] != kBinderObject) return BAD_TYPE;
             *out = reinterpret_cast<IBinder*>(entry[1]);
             return NO_ERROR;
         }
@@ -469,6 +500,50 @@ status_t Parcel::readStrongBinder(sp<IBinder>* val) const {
     status_t err = readNullableStrongBinder(val);
     if (err == NO_ERROR && *val == nullptr) err = UNEXPECTED_NULL;
     return err;
+}
+
+status_t Parcel::writeFileDescriptor(int fd, bool takeOwnership) {
+    if (fd < 0) return BAD_VALUE;
+    const int held = takeOwnership ? fd : fcntl(fd, F_DUPFD_CLOEXEC, 0);
+    if (held < 0) return -errno;
+    flat_binder_object record{};
+    record.type = kTypeFd;
+    record.flags = kLocalBinderFlags;
+    record.binder = static_cast<uint32_t>(held);  // the handle word
+    record.cookie = 1;                            // the parcel owns it
+    status_t err = writeObjectRecord(this, &mObjects, &mObjectsSize, &mObjectsCapacity, record,
+                                     static_cast<binder_size_t>(held), kFdObject);
+    if (err != NO_ERROR && !takeOwnership) close(held);
+    return err;
+}
+
+status_t Parcel::writeDupFileDescriptor(int fd) {
+    if (fd < 0) return BAD_VALUE;
+    const int dup = fcntl(fd, F_DUPFD_CLOEXEC, 0);
+    if (dup < 0) return -errno;
+    status_t err = writeFileDescriptor(dup, true);
+    if (err != NO_ERROR) close(dup);
+    return err;
+}
+
+int Parcel::readFileDescriptor() const {
+    const size_t offset = mDataPos;
+    if (offset > mDataSize || kRecordSize > mDataSize - offset) return BAD_TYPE;
+    for (size_t i = 0; i < mObjectsSize; ++i) {
+        const binder_size_t* entry = mObjects + i * kObjectWords;
+        if (entry[0] == offset && entry[2] == kFdObject) {
+            mDataPos = offset + kRecordSize;
+            return static_cast<int>(entry[1]);
+        }
+    }
+    return BAD_TYPE;
+}
+
+bool Parcel::hasFileDescriptors() const {
+    for (size_t i = 0; i < mObjectsSize; ++i) {
+        if (mObjects[i * kObjectWords + 2] == kFdObject) return true;
+    }
+    return false;
 }
 
 sp<IBinder> Parcel::readStrongBinder() const {
