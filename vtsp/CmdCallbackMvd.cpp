@@ -26,10 +26,16 @@ void CmdCallbackMvd::forEachStream(Fn fn) {
     for (auto& entry : mStreams) fn(*entry.second);
 }
 
+uint32_t CmdCallbackMvd::commandStreamId(const VtspCommand& c) {
+    if (c.code == _VTSP_CMD_CONFIG) return static_cast<uint32_t>(static_cast<int32_t>(c.u.config.data[1]));
+    return c.u.stmVideo.streamId;
+}
+
 CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
     const VtspCommand& c = cmd.command();
-    uint32_t streamId = c.u.stmVideo.streamId;
+    const uint32_t streamId = commandStreamId(c);
     std::lock_guard<std::mutex> lock(mMutex);
+    PublishOnExit publish{*this};
 
     switch (c.code) {
         case _VTSP_CMD_STREAM_VIDEO_START:
@@ -37,7 +43,6 @@ CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
         case _VTSP_CMD_STREAM_VIDEO_END:
             break;
         case _VTSP_CMD_CONFIG:
-            streamId = static_cast<uint32_t>(static_cast<int32_t>(c.u.config.data[1]));
             LOGD("_VTSP_CMD_CONFIG, streamId %d", int(streamId));
             if (mStreams.find(streamId) == mStreams.end()) {
                 LOGD("stream is not created, streamId %d", int(streamId));
@@ -69,23 +74,27 @@ CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
 
 void CmdCallbackMvd::setCaptureId(const char* id) {
     std::lock_guard<std::mutex> lock(mMutex);
+    PublishOnExit publish{*this};
     if (id != nullptr) mCaptureId = id;
     forEachStream([id](StreamInfoMvd& s) { s.setCaptureId(id); });
 }
 
 void CmdCallbackMvd::setRenderId(const char* id) {
     std::lock_guard<std::mutex> lock(mMutex);
+    PublishOnExit publish{*this};
     forEachStream([id](StreamInfoMvd& s) { s.setRenderId(id); });
 }
 
 void CmdCallbackMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config) {
     std::lock_guard<std::mutex> lock(mMutex);
+    PublishOnExit publish{*this};
     mCameraConfig = config;
     forEachStream([config](StreamInfoMvd& s) { s.setCodecParam(config); });
 }
 
 void CmdCallbackMvd::sendReplacedImage(bool start, const char* path) {
     std::lock_guard<std::mutex> lock(mMutex);
+    PublishOnExit publish{*this};
     forEachStream([start, path](StreamInfoMvd& s) { s.sendReplacedImage(start, path); });
 }
 
@@ -103,6 +112,19 @@ std::shared_ptr<StreamInfoMvd> CmdCallbackMvd::stream(uint32_t streamId) {
 CameraCodecParameter::CameraConfigEnum CmdCallbackMvd::cameraConfig() {
     std::lock_guard<std::mutex> lock(mMutex);
     return mCameraConfig;
+}
+
+void CmdCallbackMvd::publishStreams() {
+    std::vector<StreamSnapshot> streams;
+    streams.reserve(mStreams.size());
+    for (const auto& entry : mStreams) streams.push_back(entry.second->snapshot());
+    std::lock_guard<std::mutex> lock(mPublishedLock);
+    mPublished.swap(streams);
+}
+
+std::vector<StreamSnapshot> CmdCallbackMvd::publishedStreams() const {
+    std::lock_guard<std::mutex> lock(mPublishedLock);
+    return mPublished;
 }
 
 const char* CmdCallbackMvd::captureId() {

@@ -8,6 +8,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <vector>
 
 #include "CameraCodecParameter.h"
 #include "CmdCallback.h"
@@ -23,6 +24,8 @@ public:
     CmdCallbackMvd& operator=(const CmdCallbackMvd&) = delete;
 
     CmdBuffer* parse(const CmdBuffer& cmd) override;
+    // The stream a command is for: a configuration names it in its data.
+    static uint32_t commandStreamId(const VtspCommand& c);
     // The dispatcher and its streams keep the pointers given to the two
     // setters below: callers pass texts that live for the process (the
     // camera and render name constants, or names the engine keeps).
@@ -36,8 +39,20 @@ public:
     std::shared_ptr<StreamInfoMvd> stream(uint32_t streamId);
     CameraCodecParameter::CameraConfigEnum cameraConfig();
     const char* captureId();
+    // The streams as the last command or setter left them, ascending by
+    // stream id. Copied under the dispatcher's lock as each operation ends;
+    // reading them never waits for an operation in progress, and so never
+    // for the media engine.
+    std::vector<StreamSnapshot> publishedStreams() const;
 
 private:
+    // Declared after the dispatcher's lock is taken: publishes on every way out.
+    struct PublishOnExit {
+        CmdCallbackMvd& dispatcher;
+        ~PublishOnExit() { dispatcher.publishStreams(); }
+    };
+    void publishStreams();
+
     template <typename Fn>
     void forEachStream(Fn fn);
 
@@ -46,6 +61,8 @@ private:
     CameraCodecParameter::CameraConfigEnum mCameraConfig;
     const char* mCaptureId;
     std::mutex mMutex;
+    mutable std::mutex mPublishedLock;
+    std::vector<StreamSnapshot> mPublished;
 };
 
 }  // namespace android

@@ -170,11 +170,16 @@ bool StreamInfoMvd::codecParamConfig(const CmdBuffer& cmd, int prevStat) {
             cap >= 1 && cap <= static_cast<uint32_t>(p.maxBitrate) ? static_cast<int32_t>(cap)
                                                                    : p.maxBitrate;
     Mvd_ArsSetParm(mMvdStreamId, p.minBitrate, upper, (2 * p.frameRate) / 3, p.frameRate);
+    mRateControl.minBitrate = p.minBitrate;
+    mRateControl.maxBitrate = upper;
+    mRateControl.minFrameRate = (2 * p.frameRate) / 3;
+    mRateControl.frameRate = p.frameRate;
 
     if (Mvd_SetCdc(mMvdStreamId, &codec) != 0) {
         LOGE("%s: SetCodec failed !!!", "codecParamConfig");
         return false;
     }
+    mRateControl.bitrate = p.bitrate;
     Mvd_SetSendPayload(mMvdStreamId, static_cast<unsigned char>(mPayloadType));
     const int* w = codec.aiWord;
     LOGD("%s: codec set payload %d, bitrate %d, fps %d, %d x %d, mCameraConfig %d",
@@ -203,6 +208,7 @@ bool StreamInfoMvd::rtcpParamConfig(const CmdBuffer& cmd, int prevStat) {
     if (strcmp(uri, kVideoOrientationUri) == 0) {
         Mvd_RtpSetExt(mMvdStreamId, MVD_RTP_EXT_VIDEO_ORIENTATION,
                       static_cast<unsigned char>(v.extmapId));
+        mOrientationExtId = static_cast<unsigned char>(v.extmapId);
     }
 
     const int red = Mvd_RedSetEnable(mMvdStreamId, 0);
@@ -240,11 +246,35 @@ void StreamInfoMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config)
     }
     if (Mvd_SetCdc(mMvdStreamId, &codec) != 0) {
         LOGE("%s: SetCodec failed !!!", "setCodecParam");
+    } else {
+        mRateControl.bitrate = p.bitrate;
     }
     // Resumed even when the engine refused the codec: the streams then go on
     // with the codec they had, where waiting for the next modify of this
     // stream could leave every stream of the call frozen.
     resumeIfParamChanged();
+}
+
+StreamSnapshot StreamInfoMvd::snapshot() const {
+    StreamSnapshot s;
+    s.streamId = mStreamId;
+    s.mvdStreamId = mMvdStreamId;
+    s.stat = mStat;
+    s.localAddrType = mLocalAddrType;
+    memcpy(s.localIp, mLocalIp, sizeof(s.localIp));
+    s.localPort = mLocalPort;
+    s.remoteAddrType = mRemoteAddrType;
+    memcpy(s.remoteIp, mRemoteIp, sizeof(s.remoteIp));
+    s.remotePort = mRemotePort;
+    s.payloadType = mPayloadType;
+    s.rate = mRateControl;
+    s.rtcpMask = mRTCPEnableMask;
+    s.orientationExtId = mOrientationExtId;
+    s.procStartCnt = mProcStartCnt;
+    s.cameraConfig = mCameraConfig;
+    s.captureId = mCaptureId;
+    s.renderId = mRenderId;
+    return s;
 }
 
 void StreamInfoMvd::resumeIfParamChanged() {

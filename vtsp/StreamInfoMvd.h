@@ -13,6 +13,38 @@
 
 namespace android {
 
+// What the media engine was last told for a stream's rate: the codec's bit
+// rate and the rate control's range (bit/s, frames/s); zeros before any.
+struct StreamRateControl {
+    int32_t bitrate = 0;
+    int32_t minBitrate = 0;
+    int32_t maxBitrate = 0;
+    int32_t minFrameRate = 0;
+    int32_t frameRate = 0;
+};
+
+// A copy of one stream's state, taken by its owner under the dispatcher's
+// lock, that diagnostics read without touching the live stream.
+struct StreamSnapshot {
+    uint32_t streamId = 0;
+    uint32_t mvdStreamId = 0;
+    int32_t stat = 0;
+    int32_t localAddrType = 0;
+    char localIp[64] = {};
+    uint16_t localPort = 0;
+    int32_t remoteAddrType = 0;
+    char remoteIp[64] = {};
+    uint16_t remotePort = 0;
+    int32_t payloadType = 0;
+    StreamRateControl rate;
+    int32_t rtcpMask = 0;
+    int32_t orientationExtId = -1;  // -1: the extension was never set
+    int32_t procStartCnt = 0;
+    int32_t cameraConfig = 0;
+    const char* captureId = nullptr;  // texts that live for the process
+    const char* renderId = nullptr;
+};
+
 class StreamInfoMvd : public CmdCallback {
 public:
     enum StreamStat : int32_t {
@@ -58,6 +90,8 @@ public:
     bool rtcpParamConfig(const CmdBuffer& cmd, int prevStat);
 
     bool isAlive() const { return mStat != STREAM_ENDED; }
+    // For the dispatcher, which holds its lock while it copies.
+    StreamSnapshot snapshot() const;
 
     // Lifts a suspend of all engine streams that this stream caused.
     void resumeIfParamChanged();
@@ -89,6 +123,9 @@ public:
     int32_t mRTCPEnableMask;
     CameraCodecParameter::CameraConfigEnum mCameraConfig;
     std::shared_ptr<CameraCodecParameter> mCameraCodecParameter;
+    // Remembered for diagnostics only: what the engine was given last.
+    StreamRateControl mRateControl;
+    int32_t mOrientationExtId = -1;
 };
 
 // Builds the bind request that tells the modem a stream's local end. The
