@@ -44,17 +44,20 @@ public:
         mState = QUEUE_RUNNING;
     }
 
-    void pushAndSignal(const T& elem) {
+    // False when the queue refused the element (it is not running).
+    bool pushAndSignal(const T& elem) {
         {
             ScopedPthreadLock lock(mMutex);
             if (mState != QUEUE_RUNNING) {
                 __android_log_print(ANDROID_LOG_ERROR, "VTSPManager", "%s: failed to push elem",
                                     "pushAndSignal");
-                return;
+                return false;
             }
             mQueue.push_back(elem);
+            if (mQueue.size() > mHighest) mHighest = mQueue.size();
         }
         pthread_cond_signal(&mCond);
+        return true;
     }
 
     // Takes the front element into `out`; false once the queue is closed.
@@ -94,6 +97,14 @@ public:
         ScopedPthreadLock lock(mMutex);
         return mQueue.size();
     }
+    struct Depth {
+        size_t current;
+        size_t highest;  // the most elements it has held at once
+    };
+    Depth depth() {
+        ScopedPthreadLock lock(mMutex);
+        return Depth{mQueue.size(), mHighest};
+    }
 
 private:
     // Releases the elements one by one from the front, under the lock.
@@ -105,6 +116,7 @@ private:
     pthread_cond_t mCond;
     pthread_mutex_t mMutex;
     int mState = QUEUE_CLOSED;
+    size_t mHighest = 0;
 };
 
 }  // namespace android

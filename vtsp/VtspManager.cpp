@@ -72,6 +72,7 @@ VtspManager::VtspManager(const char* devName)
 
 bool VtspManager::init() {
     if (mFd == -1) mFd = open(mDevName, O_RDWR);
+    mCounters.deviceOpen = mFd != -1;
     mRxRunning = true;
     mTxRunning = true;
     mRxQueue.start();
@@ -129,10 +130,33 @@ void VtspManager::destroy() {
         close(mFd);
         mFd = -1;
     }
+    mCounters.deviceOpen = false;
 }
 
 CmdBuffer* VtspManager::parse(std::shared_ptr<CmdBuffer> cmd) {
     return mCmdCallback->parse(*cmd);
+}
+
+VtspManager::LinkStatus VtspManager::linkStatus() {
+    const LinkCounters& c = mCounters;
+    return LinkStatus{mDevName,
+                      c.deviceOpen,
+                      c.rxRunning,
+                      c.handleRunning,
+                      c.txRunning,
+                      c.recordsRead,
+                      c.bytesRead,
+                      c.readFailures,
+                      c.lastReadErrno,
+                      c.recordsWritten,
+                      c.bytesWritten,
+                      c.writeFailures,
+                      c.lastWriteErrno,
+                      c.retries,
+                      c.commandsRefused,
+                      c.repliesRefused,
+                      mRxQueue.depth(),
+                      mTxQueue.depth()};
 }
 
 bool VtspManager::getCameraResolution(CameraCodecParameter::CameraConfigEnum config,
@@ -151,6 +175,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
     auto record = std::make_unique<VPR_Comm>();
     installSigusr1Handler();
     nameThread("tVtspCmdRx");
+    vm->mCounters.rxRunning = true;
 
     int count = 0;
     while (vm->mRxRunning) {
@@ -159,6 +184,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
             continue;
         }
         ++count;
+        ++vm->mCounters.recordsRead;
         __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s, recv msg %d, targetModule %d",
                             "cmdRxFunc", count, static_cast<int>(record->targetModule));
         if (record->targetModule == VPMD_VPAD_TARGET) {
@@ -173,8 +199,9 @@ void* VtspManager::cmdRxFunc(void* arg) {
                                 static_cast<int>(record->type));
             continue;
         }
-        vm->mRxQueue.pushAndSignal(CmdBuffer::fromRecord(*record));
+        if (!vm->mRxQueue.pushAndSignal(CmdBuffer::fromRecord(*record))) ++vm->mCounters.commandsRefused;
     }
+    vm->mCounters.rxRunning = false;
     vm->mRxEnded = true;
     return nullptr;
 }
@@ -183,6 +210,7 @@ void* VtspManager::cmdHandleFunc(void* arg) {
     auto* vm = static_cast<VtspManager*>(arg);
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdHandleFunc: E", "cmdHandleFunc");
     nameThread("tVtspCmdHd");
+    vm->mCounters.handleRunning = true;
 
     while (vm->mRxRunning) {
         std::shared_ptr<CmdBuffer> cmd;
@@ -194,12 +222,18 @@ void* VtspManager::cmdHandleFunc(void* arg) {
         cmd->translate(true);
         cmd->print();
         CmdBuffer* reply = vm->parse(cmd);
+        CommandHistory::ReplyText answer;
+        CommandHistory::describeReply(reply, answer);
+        bool refused = false;
         if (reply != nullptr) {
             std::shared_ptr<CmdBuffer> owned(reply);
             owned->translate(false);
-            vm->mTxQueue.pushAndSignal(owned);
+            refused = !vm->mTxQueue.pushAndSignal(owned);
+            if (refused) ++vm->mCounters.repliesRefused;
         }
+        vm->mHistory.record(*cmd, CmdCallbackMvd::commandStreamId(cmd->command()), answer, refused);
     }
+    vm->mCounters.handleRunning = false;
     return nullptr;
 }
 
@@ -208,6 +242,7 @@ void* VtspManager::cmdTxFunc(void* arg) {
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdTxFunc: E", "cmdTxFunc");
     installSigusr1Handler();
     nameThread("tVtspCmdTx");
+    vm->mCounters.txRunning = true;
 
     while (vm->mTxRunning) {
         std::shared_ptr<CmdBuffer> reply;
@@ -219,8 +254,11 @@ void* VtspManager::cmdTxFunc(void* arg) {
         VPR_Comm record{};
         reply->compose(&record);
         __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s, write Data to VPR", "cmdTxFunc");
-        writeToVpr(vm, reinterpret_cast<const unsigned char*>(&record), kRecordSize);
+        if (writeToVpr(vm, reinterpret_cast<const unsigned char*>(&record), kRecordSize) == kRecordSize) {
+            ++vm->mCounters.recordsWritten;
+        }
     }
+    vm->mCounters.txRunning = false;
     vm->mTxEnded = true;
     return nullptr;
 }
@@ -231,11 +269,15 @@ int VtspManager::readFromVpr(VtspManager* vm, unsigned char* buf, int /*len*/) {
         const ssize_t n = read(vm->mFd, buf + done, kRecordSize - done);
         if (n > 0) {
             done += static_cast<int>(n);
+            vm->mCounters.bytesRead += static_cast<uint64_t>(n);
             continue;
         }
         const int err = errno;
         if (!vm->mRxRunning) return done;
+        ++vm->mCounters.retries;
         if (n < 0 && err == EINTR) continue;
+        ++vm->mCounters.readFailures;
+        vm->mCounters.lastReadErrno = n == 0 ? 0 : err;
         // End of file is treated like an error: the modem side has gone away
         // for now, and repeating the read at once would spin.
         __android_log_print(ANDROID_LOG_ERROR, kTag, "%s: cmdRxFunc: failed to read file, error %s",
@@ -252,11 +294,15 @@ int VtspManager::writeToVpr(VtspManager* vm, const unsigned char* buf, int len) 
         const ssize_t n = write(vm->mFd, buf + done, kRecordSize - done);
         if (n > 0) {
             done += static_cast<int>(n);
+            vm->mCounters.bytesWritten += static_cast<uint64_t>(n);
             continue;
         }
         const int err = errno;
         if (vm->mRxRunning) {
+            ++vm->mCounters.retries;
             if (n < 0 && err == EINTR) continue;
+            ++vm->mCounters.writeFailures;
+            vm->mCounters.lastWriteErrno = n == 0 ? 0 : err;
             __android_log_print(ANDROID_LOG_ERROR, kTag, "Failed to write data to %s, err: %s",
                                 vm->mDevName, failureText(n, err));
             sleep(kDeviceRetrySeconds);

@@ -20,6 +20,7 @@
 #include "CmdBuffer.h"
 #include "CmdCallbackMvd.h"
 #include "CmdLockQueue.h"
+#include "CommandHistory.h"
 
 namespace android {
 
@@ -67,6 +68,43 @@ public:
     pthread_t mHandleThread;
     CmdLockQueue<std::shared_ptr<CmdBuffer>> mRxQueue;
     CmdLockQueue<std::shared_ptr<CmdBuffer>> mTxQueue;
+
+    // What the link has done since it was made, counted by its threads.
+    struct LinkCounters {
+        std::atomic<uint64_t> recordsRead{0};
+        std::atomic<uint64_t> bytesRead{0};
+        std::atomic<uint64_t> readFailures{0};
+        std::atomic<int> lastReadErrno{0};  // 0 with failures: end of file
+        std::atomic<uint64_t> recordsWritten{0};
+        std::atomic<uint64_t> bytesWritten{0};
+        std::atomic<uint64_t> writeFailures{0};
+        std::atomic<int> lastWriteErrno{0};
+        // Transfers tried again after one that moved nothing (interrupted or failed).
+        std::atomic<uint64_t> retries{0};
+        // Commands received, and replies made, while the link was stopped: lost.
+        std::atomic<uint64_t> commandsRefused{0};
+        std::atomic<uint64_t> repliesRefused{0};
+        std::atomic<bool> deviceOpen{false};
+        std::atomic<bool> rxRunning{false};
+        std::atomic<bool> handleRunning{false};
+        std::atomic<bool> txRunning{false};
+    };
+    // A copy of the link's state for diagnostics; never waits on the device
+    // or the media engine, only on the queues' own short locks.
+    struct LinkStatus {
+        const char* devName;
+        bool deviceOpen, rxRunning, handleRunning, txRunning;
+        uint64_t recordsRead, bytesRead, readFailures;
+        int lastReadErrno;
+        uint64_t recordsWritten, bytesWritten, writeFailures;
+        int lastWriteErrno;
+        uint64_t retries, commandsRefused, repliesRefused;
+        CmdLockQueue<std::shared_ptr<CmdBuffer>>::Depth rxDepth, txDepth;
+    };
+    LinkStatus linkStatus();
+
+    LinkCounters mCounters;
+    CommandHistory mHistory;
 
 private:
     // Set by each thread as its last act, so destroy() knows when to stop
