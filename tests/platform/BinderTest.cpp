@@ -46,19 +46,9 @@ public:
     }
 };
 
-// Sends the dump transaction as a client's libbinder does and answers what
-// the binder wrote.
-std::string dumpOf(const sp<IBinder>& binder, std::vector<const char*> args) {
-    FILE* out = tmpfile();
-    Parcel data;
-    data.writeFileDescriptor(fileno(out));
-    data.writeInt32(static_cast<int32_t>(args.size()));
-    for (const char* arg : args) data.writeString16(String16(arg));
-    Parcel reply;
-    const status_t status = binder->transact(IBinder::DUMP_TRANSACTION, data, &reply);
-    std::string text(256, '\0');
-    text.resize(pread(fileno(out), &text[0], text.size(), 0));
-    fclose(out);
+std::string dumpOf(const sp<IBinder>& binder, const std::vector<std::string>& args) {
+    status_t status = UNKNOWN_ERROR;
+    const std::string text = hostbinder::dumpsys(binder, args, &status);
     return std::to_string(status) + ": " + text;
 }
 

@@ -125,6 +125,7 @@ void VideoCallEngineImpl::init(int loopback) {
     mRemoteRotation = 0;
     mRemoteSurface.clear();
     mPreviewSurface.clear();
+    mHiddenImage.clear();
     mCameraSize = -1;
     if (mLoopback) startLoopBack();
     LOGI("init, loopback? %d X", mLoopback ? 1 : 0);

@@ -23,6 +23,7 @@
 
 #include <cstdint>
 #include <mutex>
+#include <string>
 
 #include "IVideoCallEngineCallback.h"
 #include "MmeEventObserver.h"
@@ -97,6 +98,37 @@ public:
     // Capture name of a camera id: also the capture's render id.
     static const char* captureName(int cameraId);
 
+    // A copy of the engine's state for diagnostics.
+    struct Snapshot {
+        bool stateRead = false;     // false: an operation held the engine too long
+        bool callbackRead = false;  // false: a notification held the callback too long
+        sp<IVideoCallEngineCallback> callback;
+        int cameraId = -1;
+        int openCameraId = -1;
+        int64_t captureHandle = 0;
+        int cameraSize = -1;
+        int deviceOrientation = 0;
+        int screenOrientation = 0;
+        int autoRotate = 1;
+        int cameraAngle = 0;
+        int displayAngle = 0;
+        int remoteRotation = 0;
+        bool remoteSurface = false;
+        bool previewSurface = false;
+        bool localRenderStarted = false;
+        bool remoteRenderStarted = false;
+        const char* localRenderId = nullptr;
+        const char* remoteRenderId = nullptr;
+        std::string hiddenImage;
+        int uplinkQos = 0;
+        bool loopback = false;
+        int loopbackStream = 0;
+    };
+    // Copies the state under the engine's locks, each tried for at most
+    // `patienceMs`: an operation may hold them across the camera driver,
+    // the renderer or the client, and diagnostics never wait on those.
+    Snapshot snapshot(int patienceMs);
+
     sp<IGraphicBufferProducer> mRemoteSurface;
     sp<IGraphicBufferProducer> mPreviewSurface;
     int mCameraSize;
@@ -116,6 +148,9 @@ public:
     bool mLoopback;
     int mLoopbackStream;
     VtspManager* mVtspManager;
+    // The image shown in place of the camera, kept for diagnostics (the
+    // client's text lives only as long as its request); empty when none.
+    std::string mHiddenImage;
 
 private:
     int cameraAngle() const;

@@ -158,6 +158,7 @@ void VideoCallEngineImpl::setPreviewSurface(const sp<IGraphicBufferProducer>& pr
 void VideoCallEngineImpl::hideLocalImage(bool enable, const char* path) {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("hideLocalImage, enable = %d, path = %s", enable ? 1 : 0, path != nullptr ? path : "(null)");
+    mHiddenImage = enable && path != nullptr ? path : "";
     mVtspManager->mCmdCallback->sendReplacedImage(enable, path);
     if (!mLoopback || mLoopbackStream == 0) return;
     if (enable) {

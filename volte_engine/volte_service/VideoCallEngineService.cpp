@@ -2,9 +2,16 @@
 
 #include <android/log.h>
 #include <binder/IServiceManager.h>
+#include <binder/PermissionCache.h>
 #include <gui/IGraphicBufferProducer.h>
+#include <unistd.h>
 #include <utils/String16.h>
 
+#include <cerrno>
+#include <cstdio>
+#include <string>
+
+#include "VideoCallEngineDump.h"
 #include "VideoCallEngineImpl.h"
 
 namespace android {
@@ -19,6 +26,24 @@ constexpr const char* kTag = "VideoCallEngineService";
 // Codes the service answers with 0 and nothing else.
 constexpr uint32_t kSilentCodes[] = {14, 15, 18};
 constexpr int kHide = 1;
+
+constexpr const char* kDumpPermission = "android.permission.DUMP";
+
+// Writes all of `text`; the reader (dumpsys) may take it in pieces.
+status_t writeAll(int fd, const std::string& text) {
+    size_t done = 0;
+    while (done < text.size()) {
+        const ssize_t n = write(fd, text.data() + done, text.size() - done);
+        if (n > 0) {
+            done += static_cast<size_t>(n);
+        } else if (n == 0) {
+            return -EIO;
+        } else if (errno != EINTR) {
+            return -errno;
+        }
+    }
+    return NO_ERROR;
+}
 
 bool isSilent(uint32_t code) {
     for (uint32_t silent : kSilentCodes) {
@@ -66,6 +91,21 @@ void VideoCallEngineService::release() {
 void VideoCallEngineService::binderDied(const wp<IBinder>& /*who*/) {
     LOGI("binderDied, ims app died");
     if (mVideoCallEngineImpl != nullptr) mVideoCallEngineImpl->release();
+}
+
+status_t VideoCallEngineService::dump(int fd, const Vector<String16>& args) {
+    if (fd < 0) return BAD_VALUE;
+    int32_t pid = 0;
+    int32_t uid = 0;
+    if (!PermissionCache::checkCallingPermission(String16(kDumpPermission), &pid, &uid)) {
+        char denial[128];
+        snprintf(denial, sizeof(denial), "Permission Denial: can't dump %s from pid=%d, uid=%d\n", kServiceName,
+                 pid, uid);
+        return writeAll(fd, denial);
+    }
+    // The text is built with every lock released again: a slow reader holds
+    // up only this binder thread.
+    return writeAll(fd, VideoCallEngineDump(args).text(mVideoCallEngineImpl));
 }
 
 status_t VideoCallEngineService::onTransact(uint32_t code, const Parcel& data, Parcel* reply,

@@ -7,6 +7,8 @@
 #include <binder/Binder.h>
 #include <binder/IBinder.h>
 #include <binder/Parcel.h>
+#include <utils/String16.h>
+#include <utils/Vector.h>
 
 #include <mutex>
 
@@ -47,6 +49,10 @@ public:
 
     status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override;
     void binderDied(const wp<IBinder>& who) override;
+    // `dumpsys VideoCallEngineService [--engine] [--link] [--streams]
+    // [--history] [-h]`: reached through BBinder's handling of the dump
+    // transaction. Callers without android.permission.DUMP get one line.
+    status_t dump(int fd, const Vector<String16>& args) override;
     void release();
 
     sp<IVideoCallEngineCallback> mCallback;

@@ -10,9 +10,12 @@
 #ifndef QUELLBORN_HOST_HOSTBINDER_H
 #define QUELLBORN_HOST_HOSTBINDER_H
 
+#include <binder/IBinder.h>
 #include <sys/types.h>
+#include <utils/StrongPointer.h>
 
 #include <string>
+#include <vector>
 
 namespace hostbinder {
 
@@ -30,6 +33,13 @@ bool clientIdentity(pid_t* pid, uid_t* uid);
 void setPermission(const std::string& permission, uid_t uid, bool granted);
 void clearPermissions();
 bool permissionGranted(const std::string& permission, uid_t uid);
+
+// What `adb shell dumpsys <service> args...` does: sends the dump
+// transaction as a client's libbinder sends it (a file descriptor, the
+// argument count, each argument as a String16) and answers what the service
+// wrote to the descriptor. `status` receives the transaction's status.
+std::string dumpsys(const android::sp<android::IBinder>& service, const std::vector<std::string>& args,
+                    android::status_t* status = nullptr);
 
 }  // namespace hostbinder
 
