@@ -1,13 +1,14 @@
 // The engine loaded from every side at once: client threads sending the
 // service's transactions, the modem starting, holding, resuming and ending
 // streams on the link's pipe, and the media libraries raising events on their
-// own threads. Each side counts what it did: every request must be answered,
+// own threads, while dumpsys reads the service. Each side counts what it did: every request must be answered,
 // every stream start get exactly one bind request, and every event reach the
 // client, or be dropped for want of a callback, exactly once.
 #include <atomic>
 #include <map>
 
 #include "EngineTestUtil.h"
+#include "HostBinder.h"
 #include "MmeJni.h"
 #include "Mvd.h"
 #include "WatchedThreads.h"
@@ -128,7 +129,21 @@ TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
             ++sizes;
         } while (loading());
     });
+    // dumpsys while all of it runs: every dump whole, none waiting for the rest.
+    size_t dumps = 0;
+    std::string badDump;
+    load.run([&] {
+        do {
+            const std::string text = hostbinder::dumpsys(enginetest::service(), {});
+            ++dumps;
+            for (const char* heading : {"engine:\n", "\nmodem link:\n", "\nstreams: ", "\nrecent commands: "}) {
+                if (badDump.empty() && text.find(heading) == std::string::npos) badDump = text;
+            }
+        } while (loading());
+    });
     load.join();
+    EXPECT_EQ("", badDump);
+    EXPECT_LT(0u, dumps);
 
     size_t rounds = 0;
     for (int i = 0; i < kClients; ++i) {
@@ -148,6 +163,10 @@ TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
     EXPECT_EQ(static_cast<size_t>(starts), hostfakes::callCount("Mvd_Open") - opensBefore);
     EXPECT_TRUE(eventually([&] { return hostfakes::callCount("Mvd_Close") - closesBefore == static_cast<size_t>(starts); }))
             << starts << " streams started, " << hostfakes::callCount("Mvd_Close") - closesBefore << " closed";
+    // The link counted what went over the pipe.
+    const std::string link = hostbinder::dumpsys(enginetest::service(), {"--link"});
+    EXPECT_NE(std::string::npos, link.find("  read: " + std::to_string(4 * starts) + " records, ")) << link;
+    EXPECT_NE(std::string::npos, link.find("  written: " + std::to_string(binds) + " records, ")) << link;
 
     // Every event reached the engine once, then the client (each transaction whole) or nobody.
     EXPECT_EQ(0, unhandledMvd);

@@ -38,9 +38,11 @@ TEST(ScenarioParse, EachActorsStepsKeepTheirArguments) {
                               "wait 20\n"
                               "expect event 11 480 640 0\n"
                               "expect call Mvd_Open(\"10.0.0.1\", 6000\n"
-                              "expect bind stream=2 local=[::1]:6000\n");
+                              "expect bind stream=2 local=[::1]:6000\n"
+                              "dump --link   # as dumpsys takes them\n"
+                              "expect dump read: 1 records\n");
     const std::vector<ScenarioStep>& steps = s.steps();
-    ASSERT_EQ(11u, steps.size());
+    ASSERT_EQ(13u, steps.size());
     EXPECT_EQ(Actor::kHeading, steps[0].actor);
     EXPECT_EQ("set-up", steps[0].text);
     EXPECT_EQ(Actor::kClient, steps[1].actor);
@@ -60,6 +62,9 @@ TEST(ScenarioParse, EachActorsStepsKeepTheirArguments) {
     EXPECT_EQ("Mvd_Open(\"10.0.0.1\", 6000", steps[9].text);
     EXPECT_TRUE(steps[10].hasLocal);
     EXPECT_EQ(2u, steps[10].modem.stream.localAddr.type);
+    EXPECT_EQ(Actor::kDump, steps[11].actor);
+    EXPECT_EQ("--link", steps[11].text);
+    EXPECT_EQ("read: 1 records", steps[12].text);
 }
 
 TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
@@ -78,7 +83,8 @@ TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
             {"expect bind local=1.2.3.4:5", "line 1: expected bind stream=N [local=IP:PORT] but found 'local=1.2.3.4:5'"},
             {"expect call", "line 1: expected call TEXT but found end of line"},
             {"wait 70000", "line 1: expected wait 0..60000 (milliseconds) but found '70000'"},
-            {"camera 1", "line 1: expected client, modem, media, wait, expect or a ## heading but found 'camera'"},
+            {"camera 1", "line 1: expected client, modem, media, wait, dump, expect or a ## heading but found 'camera'"},
+            {"expect dump", "line 1: expected dump TEXT but found end of line"},
     };
     for (const auto& c : cases) EXPECT_EQ(c.second, errorOf(c.first)) << c.first;
 }

@@ -57,6 +57,7 @@ const VerbSpec kExpectVerbs[] = {
         {"no-event", "N", Args::kInts, 1, 1},
         {"bind", "stream=N [local=IP:PORT]", Args::kBind, 0, 0},
         {"log", "TEXT", Args::kText, 0, 0},
+        {"dump", "TEXT", Args::kText, 0, 0},
 };
 
 const VerbSpec kWait = {"wait", "MILLISECONDS", Args::kInts, 1, 1};
@@ -211,6 +212,13 @@ bool parseLine(TokenCursor& cursor, ScenarioStep* step, std::string* error) {
         step->verb = cursor.next();
         return StepSyntax::parse(cursor, &step->modem, error);
     }
+    if (actor == "dump") {
+        // What `adb shell dumpsys VideoCallEngineService ARGS` prints.
+        step->actor = Actor::kDump;
+        step->verb = cursor.next();
+        step->text = cursor.rest();
+        return true;
+    }
     if (actor == "wait") {
         step->actor = Actor::kWait;
         step->verb = cursor.next();
@@ -221,7 +229,7 @@ bool parseLine(TokenCursor& cursor, ScenarioStep* step, std::string* error) {
         }
         return true;
     }
-    *error = cursor.expected("client, modem, media, wait, expect or a ## heading");
+    *error = cursor.expected("client, modem, media, wait, dump, expect or a ## heading");
     return false;
 }
 

@@ -12,13 +12,13 @@
 #include "StepSyntax.h"
 
 struct ScenarioStep {
-    enum class Actor { kHeading, kClient, kModem, kMedia, kWait, kExpect };
+    enum class Actor { kHeading, kClient, kModem, kMedia, kWait, kExpect, kDump };
     Actor actor = Actor::kHeading;
     int line = 0;
     std::string source;         // the line as written, without comment
     std::string verb;           // "camera", "rtp-break", "call", ...
     std::vector<int32_t> ints;  // numeric arguments in order
-    std::string text;           // free text (path, JSON, call text, heading)
+    std::string text;           // free text (path, JSON, call text, heading, dump arguments)
     StepSyntax::Step modem;     // modem steps and `expect bind`
     bool hasLocal = false;      // `expect bind` names a local address
 };

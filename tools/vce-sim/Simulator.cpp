@@ -1,9 +1,14 @@
 #include "Simulator.h"
 
+#include <binder/IServiceManager.h>
+#include <utils/String16.h>
+
 #include <chrono>
+#include <sstream>
 #include <thread>
 #include <tuple>
 
+#include "HostBinder.h"
 #include "HostFakes.h"
 #include "RecordDecoder.h"
 #include "TokenCursor.h"
@@ -46,7 +51,8 @@ Simulator::Simulator(const Options& options, std::ostream& out)
       mMedia(&mTimeline),
       mServiceRegistered(startService()),
       mClient(&mTimeline),
-      mPrinter(out, options.verbose, options.colour) {
+      mPrinter(out, options.verbose, options.colour),
+      mVerbose(options.verbose) {
     harvestCalls(Actor::kClient);
     mPrinter.print(mTimeline.takeNew());
 }
@@ -101,8 +107,30 @@ std::vector<std::string> Simulator::play(const Scenario& scenario) {
     }
     settle();
     harvestCalls(Actor::kClient);
+    if (mVerbose) {
+        note(Kind::kHeading, "", "the service's state at the end");
+        dump("");
+    }
     mPrinter.print(mTimeline.takeNew());
     return failures;
+}
+
+void Simulator::dump(const std::string& args) {
+    std::vector<std::string> words;
+    std::istringstream in(args);
+    for (std::string word; in >> word;) words.push_back(word);
+    TimelineEntry entry;
+    entry.actor = "shell";
+    entry.target = "service";
+    entry.text = "dumpsys VideoCallEngineService" + (args.empty() ? "" : " " + args);
+    mTimeline.add(entry);
+    const android::sp<android::IBinder> service = android::defaultServiceManager()->checkService(
+            android::String16(android::VideoCallEngineService::kServiceName));
+    android::status_t status = android::NAME_NOT_FOUND;
+    mLastDump = service != nullptr ? hostbinder::dumpsys(service, words, &status) : "";
+    std::istringstream lines(mLastDump);
+    for (std::string line; std::getline(lines, line);) note(Kind::kEvent, "shell", "| " + line);
+    if (status != android::NO_ERROR) note(Kind::kEvent, "shell", "<- status " + std::to_string(status));
 }
 
 void Simulator::run(const ScenarioStep& step) {
@@ -115,6 +143,7 @@ void Simulator::run(const ScenarioStep& step) {
         case Actor::kClient: mClient.perform(step); break;
         case Actor::kModem: mModem.send(step.modem); break;
         case Actor::kMedia: mMedia.perform(step); break;
+        case Actor::kDump: dump(step.text); break;
         case Actor::kWait:
             note(Kind::kStep, "wait", std::to_string(step.ints[0]) + " ms");
             std::this_thread::sleep_for(std::chrono::milliseconds(step.ints[0]));
@@ -162,6 +191,9 @@ std::string Simulator::check(const ScenarioStep& step) const {
     if (step.verb == "no-event") return checkEvent(step, false);
     if (step.verb == "bind") return checkBind(step);
     if (step.verb == "log") return checkLog(step);
+    if (step.verb == "dump" && mLastDump.find(step.text) == std::string::npos) {
+        return mLastDump.empty() ? "no dump was taken before it" : "not in the last dump";
+    }
     if (step.verb == "reply" && mClient.lastReply() != step.ints[0]) {
         return "the reply was " + std::to_string(mClient.lastReply());
     }

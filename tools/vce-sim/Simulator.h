@@ -58,6 +58,8 @@ private:
     std::string checkEvent(const ScenarioStep& step, bool wanted) const;
     std::string checkBind(const ScenarioStep& step) const;
     std::string checkLog(const ScenarioStep& step) const;
+    // Runs dumpsys on the service with `args` (blank-separated) and shows its lines.
+    void dump(const std::string& args);
     void note(TimelineEntry::Kind kind, const std::string& actor, const std::string& text);
 
     Timeline mTimeline;
@@ -70,6 +72,8 @@ private:
     TimelinePrinter mPrinter;
     size_t mHarvested = 0;
     Marks mMarks;
+    const bool mVerbose;
+    std::string mLastDump;
 };
 
 #endif  // QUELLBORN_TOOLS_VCESIM_SIMULATOR_H
