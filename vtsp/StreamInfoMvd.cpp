@@ -256,6 +256,7 @@ void StreamInfoMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config)
 }
 
 StreamSnapshot StreamInfoMvd::snapshot() const {
+    static_assert(sizeof(StreamSnapshot::localIp) == kIpFieldSize, "the snapshot holds a whole address text");
     StreamSnapshot s;
     s.streamId = mStreamId;
     s.mvdStreamId = mMvdStreamId;

@@ -82,14 +82,28 @@ bool VtspManager::init() {
     installSigusr1Handler();
     if (mRxThread == 0) {
         mRxEnded = false;
-        if (pthread_create(&mRxThread, nullptr, cmdRxFunc, this) != 0) mRxThread = 0;
+        // Counted as running from here, so a dump right after init never
+        // shows a thread that has not been scheduled yet as stopped.
+        mCounters.rxRunning = true;
+        if (pthread_create(&mRxThread, nullptr, cmdRxFunc, this) != 0) {
+            mRxThread = 0;
+            mCounters.rxRunning = false;
+        }
     }
     if (mTxThread == 0) {
         mTxEnded = false;
-        if (pthread_create(&mTxThread, nullptr, cmdTxFunc, this) != 0) mTxThread = 0;
+        mCounters.txRunning = true;
+        if (pthread_create(&mTxThread, nullptr, cmdTxFunc, this) != 0) {
+            mTxThread = 0;
+            mCounters.txRunning = false;
+        }
     }
     if (mHandleThread == 0) {
-        if (pthread_create(&mHandleThread, nullptr, cmdHandleFunc, this) != 0) mHandleThread = 0;
+        mCounters.handleRunning = true;
+        if (pthread_create(&mHandleThread, nullptr, cmdHandleFunc, this) != 0) {
+            mHandleThread = 0;
+            mCounters.handleRunning = false;
+        }
     }
     return true;
 }
@@ -175,7 +189,6 @@ void* VtspManager::cmdRxFunc(void* arg) {
     auto record = std::make_unique<VPR_Comm>();
     installSigusr1Handler();
     nameThread("tVtspCmdRx");
-    vm->mCounters.rxRunning = true;
 
     int count = 0;
     while (vm->mRxRunning) {
@@ -210,7 +223,6 @@ void* VtspManager::cmdHandleFunc(void* arg) {
     auto* vm = static_cast<VtspManager*>(arg);
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdHandleFunc: E", "cmdHandleFunc");
     nameThread("tVtspCmdHd");
-    vm->mCounters.handleRunning = true;
 
     while (vm->mRxRunning) {
         std::shared_ptr<CmdBuffer> cmd;
@@ -242,7 +254,6 @@ void* VtspManager::cmdTxFunc(void* arg) {
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdTxFunc: E", "cmdTxFunc");
     installSigusr1Handler();
     nameThread("tVtspCmdTx");
-    vm->mCounters.txRunning = true;
 
     while (vm->mTxRunning) {
         std::shared_ptr<CmdBuffer> reply;

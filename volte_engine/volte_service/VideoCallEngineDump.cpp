@@ -1,7 +1,6 @@
 #include "VideoCallEngineDump.h"
 
 #include <binder/IInterface.h>
-#include <utils/String8.h>
 
 #include <cinttypes>
 #include <cstdarg>
@@ -83,11 +82,11 @@ std::string seconds(int64_t ms) {
 }  // namespace
 
 VideoCallEngineDump::VideoCallEngineDump(const Vector<String16>& args) {
+    // Compared as String16: every platform release has its equality.
     for (size_t i = 0; i < args.size(); ++i) {
-        const String8 arg(args[i]);
-        if (strcmp(arg.string(), kHelp) == 0) mHelp = true;
+        if (args[i] == String16(kHelp)) mHelp = true;
         for (const Option& option : kOptions) {
-            if (strcmp(arg.string(), option.name) == 0) mSections |= option.section;
+            if (args[i] == String16(option.name)) mSections |= option.section;
         }
     }
     if (mSections == 0) mSections = SECTION_ALL;
