@@ -1,6 +1,5 @@
 #include "VideoCallEngineDump.h"
 
-#include <binder/IInterface.h>
 
 #include <cinttypes>
 #include <cstdarg>
@@ -117,12 +116,10 @@ void VideoCallEngineDump::appendEngine(std::string& out, VideoCallEngineImpl& en
     out += "engine:\n";
     if (!s.callbackRead) {
         appendf(out, "  callback: not read, a notification held it for more than %d ms\n", kEnginePatienceMs);
-    } else if (s.callback == nullptr) {
+    } else if (!s.callbackSet) {
         out += "  callback: none\n";
     } else {
-        // A proxy knows from the driver whether its process lives: no call is made.
-        const bool alive = IInterface::asBinder(s.callback)->isBinderAlive();
-        appendf(out, "  callback: registered, binder %s\n", yesNo(alive, "alive", "dead"));
+        appendf(out, "  callback: registered, binder %s\n", yesNo(s.callbackAlive, "alive", "dead"));
     }
     if (!s.stateRead) {
         appendf(out, "  state: not read, an operation held the engine for more than %d ms\n", kEnginePatienceMs);

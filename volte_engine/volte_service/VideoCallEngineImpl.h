@@ -102,7 +102,8 @@ public:
     struct Snapshot {
         bool stateRead = false;     // false: an operation held the engine too long
         bool callbackRead = false;  // false: a notification held the callback too long
-        sp<IVideoCallEngineCallback> callback;
+        bool callbackSet = false;
+        bool callbackAlive = false;
         int cameraId = -1;
         int openCameraId = -1;
         int64_t captureHandle = 0;

@@ -1,5 +1,6 @@
 // The engine's state copied for diagnostics without waiting on the devices,
 // the libraries or the client that its operations may be waiting on.
+#include <binder/IInterface.h>
 #include <pthread.h>
 #include <unistd.h>
 
@@ -54,7 +55,11 @@ VideoCallEngineImpl::Snapshot VideoCallEngineImpl::snapshot(int patienceMs) {
     }
     if (lockWithin(patienceMs, [this] { return pthread_mutex_trylock(&mLock) == 0; })) {
         s.callbackRead = true;
-        s.callback = mNotifyCallback;
+        s.callbackSet = mNotifyCallback != nullptr;
+        // A proxy knows from the driver whether its process lives: asking
+        // makes no call. Asked here, so the dump never holds the proxy and
+        // never becomes the one that drops it last.
+        s.callbackAlive = s.callbackSet && IInterface::asBinder(mNotifyCallback)->isBinderAlive();
         pthread_mutex_unlock(&mLock);
     }
     return s;
