@@ -26,6 +26,11 @@ thread_local ClientIdentity tClient;
 
 }  // namespace
 
+// There is no driver to open and no process state is ever made; defining the
+// destructor (the class's key function) gives ProcessState the type
+// information that sp<ProcessState> in IPCThreadState refers to.
+ProcessState::~ProcessState() {}
+
 IPCThreadState* IPCThreadState::self() {
     pthread_once(&gStateKeyOnce, [] { pthread_key_create(&gStateKey, threadDestructor); });
     auto* state = static_cast<IPCThreadState*>(pthread_getspecific(gStateKey));
