@@ -7,7 +7,10 @@
 
 #include <gmock/gmock.h>
 
+#include <atomic>
+#include <future>
 #include <sstream>
+#include <thread>
 
 #include "EngineTestUtil.h"
 #include "HostBinder.h"
@@ -253,4 +256,31 @@ TEST_F(DumpTest, HistoryKeepsTheLast32Commands) {
         EXPECT_GE(at, previous) << line;  // monotonic
         previous = at;
     }
+}
+
+// A client that does not answer a notification holds the callback lock: the
+// dump reports that part as not read and prints the rest without waiting.
+TEST_F(DumpTest, AClientStuckInANotificationDoesNotHoldUpTheDump) {
+    std::promise<void> answer;
+    std::shared_future<void> answered = answer.get_future().share();
+    std::atomic<bool> notified{false};
+    sp<hostbinder::RemoteBinder> stuck = new hostbinder::RemoteBinder(
+            [&](uint32_t, const Parcel&, Parcel* reply, uint32_t) {
+                notified = true;
+                answered.wait();
+                reply->writeInt32(0);
+                return NO_ERROR;
+            },
+            String16("android.videocallengine.callback"));
+    send(kSetCallback, {}, stuck);
+    std::thread media([] { mmeEvent(22); });
+    ASSERT_TRUE(eventually([&] { return notified.load(); }));
+    const std::string text = dump();
+    answer.set_value();
+    media.join();
+    EXPECT_EQ("  callback: not read, a notification held it for more than 100 ms", field(text, "engine:", "  callback:"));
+    EXPECT_EQ("  camera: id -1, open -1, handle 0x0", field(text, "engine:", "  camera:"));
+    EXPECT_EQ("streams: 0", field(text, "streams:", "streams:"));
+    EXPECT_EQ("  callback: registered, binder alive", field(dump({"--engine"}), "engine:", "  callback:"));
+    send(kCleanCallback);
 }
