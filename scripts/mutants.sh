@@ -38,6 +38,16 @@ suites_of() {
   printf '%s' "$r"
 }
 
+# The build targets those suites need: a mutant rebuilds only these.
+targets_of() {
+  local t=""
+  [[ $1 == *@vtsp* ]] && t+=" vtsp_tests"
+  [[ $1 == *@engine* ]] && t+=" engine_tests"
+  [[ $1 == *@jvm* ]] && t+=" jvm_tests quellborn"
+  [[ $1 == *@tools* ]] && t+=" tools_tests vce-sim vtsp"
+  printf '%s' "${t:-all}"
+}
+
 occurrences() {  # file text -> how often text occurs
   python3 - "$1" "$2" <<'EOF'
 import sys
@@ -89,6 +99,7 @@ while IFS= read -r line <&3; do
   fields "$line"
   [ ${#F[@]} -eq 6 ] || { echo "malformed: $line"; continue; }
   id=${F[0]} file=${F[1]} find=${F[2]} repl=${F[3]} suites=$(suites_of "${F[4]}") what=${F[5]}
+  targets=$(targets_of "${F[4]}")
   [[ "$id $file" =~ $FILTER ]] || continue
   if [ "$(occurrences "$file" "$find")" != 1 ]; then
     printf '%-6s %-9s %s\n' "$id" "SKIPPED" "text not found once in $file"; skipped=$((skipped + 1)); continue
@@ -96,7 +107,8 @@ while IFS= read -r line <&3; do
   cp "$file" "$backup"; current=$file
   apply "$file" "$find" "$repl"
   t0=$(date +%s)
-  if ! cmake --build "$BUILD" -j"$(nproc)" > "$BUILD/mutant-$id.log" 2>&1; then
+  # shellcheck disable=SC2086  # one word per target
+  if ! cmake --build "$BUILD" -j"$(nproc)" --target $targets > "$BUILD/mutant-$id.log" 2>&1; then
     verdict="SKIPPED"; note="does not compile (see $BUILD/mutant-$id.log)"; skipped=$((skipped + 1))
   elif (cd "$BUILD" && ctest -R "$suites" --timeout "$TEST_TIMEOUT" -j"$(nproc)" >> "mutant-$id.log" 2>&1); then
     verdict="SURVIVED"; note=$what; survived=$((survived + 1)); survivors+=("$id")
