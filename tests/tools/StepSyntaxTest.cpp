@@ -68,12 +68,16 @@ TEST(StepSyntaxRecord, DirectionsByNameOrNumberAndCodesByStep) {
 }
 
 TEST(StepSyntaxRecord, Ipv6AddressesBracketedOrBareTravelBigEndian) {
-    for (const char* text : {"start stream=1 local=[2001:db8::1]:6000", "start stream=1 local=2001:db8::1:6000"}) {
-        const VtspCommand body = bodyOf(parsed(text).record());
-        EXPECT_EQ(2u, body.u.stmVideo.localAddr.type) << text;
-        const uint8_t* groups = reinterpret_cast<const uint8_t*>(body.u.stmVideo.localAddr.ipv6);
-        EXPECT_EQ((std::vector<uint8_t>{0x20, 0x01, 0x0d, 0xb8}), std::vector<uint8_t>(groups, groups + 4)) << text;
-        EXPECT_EQ(0x01, groups[15]) << text;
+    for (const char* text : {"start stream=1 local=[2001:db8::1]:6000 remote=[fe80::2:3]:5000",
+                             "start stream=1 local=2001:db8::1:6000 remote=fe80::2:3:5000"}) {
+        const VPR_Comm r = parsed(text).record();
+        EXPECT_EQ((std::vector<uint8_t>{0xfe, 0x80, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x02, 0, 0x03, 0x13, 0x88}),
+                  bytesAt(r, 0xDC, 18))
+                << text;
+        EXPECT_EQ((std::vector<uint8_t>{2, 0, 0, 0}), bytesAt(r, 0xF0, 4)) << text;
+        EXPECT_EQ((std::vector<uint8_t>{0x20, 0x01, 0x0d, 0xb8, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0x01, 0x17, 0x70}),
+                  bytesAt(r, 0xFC, 18))
+                << text;
     }
 }
 

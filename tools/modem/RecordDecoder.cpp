@@ -46,19 +46,6 @@ std::string targetText(uint32_t target) {
     }
 }
 
-VtspCommand commandOf(const VPR_Comm& record) {
-    VtspCommand body;
-    memcpy(&body, record.body, sizeof(body));
-    return body;
-}
-
-VprNetBind bindOf(const VPR_Comm& record) {
-    VprNetBind body;
-    memcpy(&body, record.body, sizeof(body));
-    swapAddress(body.addr);
-    return body;
-}
-
 std::string streamSummary(const VPR_Comm& record) {
     const vtspcodec::StreamCommand c = StepSyntax::fromRecord(record).stream;
     std::ostringstream out;
@@ -71,17 +58,19 @@ std::string streamSummary(const VPR_Comm& record) {
 }
 
 std::string commandSummary(const VPR_Comm& record) {
-    const VtspCommand body = commandOf(record);
+    const int32_t code = vtspcodec::codeOf(record);
     std::string text;
-    if (body.code == _VTSP_CMD_CONFIG) {
-        text = "CONFIG stream " + std::to_string(body.u.config.data[1]) + " rtcp " +
-               RecordDecoder::rtcpMaskText(body.u.config.data[2]) + (body.u.config.data[0] == 1 ? "" : " off");
-    } else if (vtspcodec::commandName(body.code) != nullptr) {
+    if (code == _VTSP_CMD_CONFIG) {
+        const vtspcodec::ConfigCommand c = vtspcodec::readConfigCommand(record);
+        text = "CONFIG stream " + std::to_string(c.data[1]) + " rtcp " + RecordDecoder::rtcpMaskText(c.data[2]) +
+               (c.data[0] == 1 ? "" : " off");
+    } else if (vtspcodec::commandName(code) != nullptr) {
         text = streamSummary(record);
     } else {
-        text = "code " + std::to_string(body.code) + " (unknown command)";
+        text = "code " + std::to_string(code) + " (unknown command)";
     }
-    if (record.type != 0) text += " [type " + std::to_string(record.type) + ": dropped]";
+    const uint32_t type = vtspcodec::trailerOf(record).type;
+    if (type != 0) text += " [type " + std::to_string(type) + ": dropped]";
     return text;
 }
 
@@ -103,15 +92,16 @@ void describeStream(const VPR_Comm& record, std::vector<std::string>* lines) {
 }
 
 void describeCommand(const VPR_Comm& record, std::vector<std::string>* lines) {
-    const VtspCommand body = commandOf(record);
-    const char* name = vtspcodec::commandName(body.code);
+    const int32_t code = vtspcodec::codeOf(record);
+    const vtspcodec::ConfigCommand c = vtspcodec::readConfigCommand(record);
+    const char* name = vtspcodec::commandName(code);
     lines->push_back("  " + std::string(name != nullptr ? name : "unknown command") + " (code " +
-                     std::to_string(body.code) + ")  infc " + std::to_string(body.infc));
-    if (record.type != 0) {
-        lines->push_back("  type " + std::to_string(record.type) + ": the link drops video commands whose type is not 0");
+                     std::to_string(code) + ")  infc " + std::to_string(c.infc));
+    const uint32_t type = vtspcodec::trailerOf(record).type;
+    if (type != 0) {
+        lines->push_back("  type " + std::to_string(type) + ": the link drops video commands whose type is not 0");
     }
-    if (body.code == _VTSP_CMD_CONFIG) {
-        const VtspConfigView& c = body.u.config;
+    if (code == _VTSP_CMD_CONFIG) {
         lines->push_back("  template " + std::to_string(c.templCode) +
                          (c.templCode == TEMPL_RTCP_FB ? " (RTCP feedback)" : " (unknown)") + "  on " +
                          std::to_string(c.data[0]) + "  stream " + std::to_string(c.data[1]) + "  mask " +
@@ -124,12 +114,12 @@ void describeCommand(const VPR_Comm& record, std::vector<std::string>* lines) {
 }
 
 void describeBody(const VPR_Comm& record, std::vector<std::string>* lines) {
-    switch (record.targetModule) {
+    switch (vtspcodec::trailerOf(record).targetModule) {
         case VPMD_VIDEO_CMDEVT_TARGET:
             describeCommand(record, lines);
             break;
         case VPMD_NET_TARGET: {
-            const VprNetBind bind = bindOf(record);
+            const vtspcodec::BindRequest bind = vtspcodec::readBindRequest(record);
             lines->push_back("  " + std::string(bind.code == VPR_NET_CMD_BIND ? "BIND" : "unknown network request") +
                              " (code " + std::to_string(bind.code) + ")  stream " + std::to_string(bind.streamId) +
                              "  address " + endpoint(bind.addr) + "  type " + std::to_string(bind.addr.type) + " (" +
@@ -149,33 +139,35 @@ void describeBody(const VPR_Comm& record, std::vector<std::string>* lines) {
 }  // namespace
 
 std::string RecordDecoder::summary(const VPR_Comm& record) {
-    switch (record.targetModule) {
+    const vtspcodec::Trailer trailer = vtspcodec::trailerOf(record);
+    switch (trailer.targetModule) {
         case VPMD_VIDEO_CMDEVT_TARGET:
             return commandSummary(record);
         case VPMD_NET_TARGET: {
-            const VprNetBind bind = bindOf(record);
+            const vtspcodec::BindRequest bind = vtspcodec::readBindRequest(record);
             if (bind.code != VPR_NET_CMD_BIND) return "NET code " + std::to_string(bind.code) + " (unknown)";
             return "BIND stream " + std::to_string(bind.streamId) + " " + endpoint(bind.addr);
         }
         case VPMD_VPAD_TARGET:
             return "LIVENESS (modem is active)";
         default:
-            return "target " + std::to_string(record.targetModule) + " (unknown) body " +
+            return "target " + std::to_string(trailer.targetModule) + " (unknown) body " +
                    hexExcerpt(record.body, 8);
     }
 }
 
 std::vector<std::string> RecordDecoder::describe(const VPR_Comm& record, size_t index) {
     std::vector<std::string> lines;
-    std::string header = "record " + std::to_string(index) + "  type " + std::to_string(record.type) +
-                         "  targetModule " + targetText(record.targetModule) + "  recordLength " +
-                         std::to_string(record.recordLength);
-    if (record.recordLength != kVprCommSize) {
+    const vtspcodec::Trailer trailer = vtspcodec::trailerOf(record);
+    std::string header = "record " + std::to_string(index) + "  type " + std::to_string(trailer.type) +
+                         "  targetModule " + targetText(trailer.targetModule) + "  recordLength " +
+                         std::to_string(trailer.recordLength);
+    if (trailer.recordLength != kVprCommSize) {
         header += " (not 3664: if the trailer looks like body bytes, the capture is off a record boundary)";
     }
     lines.push_back(header);
     describeBody(record, &lines);
-    if (record.targetModule != VPMD_NET_TARGET) {
+    if (trailer.targetModule != VPMD_NET_TARGET) {
         lines.push_back(std::string("  step") + (StepSyntax::exact(record) ? ": " : " (approximate): ") +
                         printable(StepSyntax::format(StepSyntax::fromRecord(record))));
     }

@@ -239,36 +239,6 @@ std::string configText(const Step& step) {
     return out;
 }
 
-StreamCommand streamFromBody(const VtspCommand& body) {
-    VtspStmVideoView v = body.u.stmVideo;
-    swapAddress(v.remoteAddr);
-    swapAddress(v.localAddr);
-    swap16(v.remoteControlPort);
-    swap16(v.localControlPort);
-    StreamCommand c;
-    c.code = body.code;
-    c.infc = body.infc;
-    c.streamId = v.streamId;
-    c.dir = v.dir;
-    c.encoder = v.encoder;
-    c.encodeType[0] = v.encodeType[0];
-    c.encodeType[1] = v.encodeType[1];
-    c.extension = v.extension;
-    c.extmapId = v.extmapId;
-    char uri[kExtmapUriSize + 1];
-    copyExtmapUri(v, uri);
-    c.extmapUri = uri;
-    c.confMask = v.confMask;
-    c.rdnDynType = v.rdnDynType;
-    c.remoteAddr = v.remoteAddr;
-    c.remoteControlPort = v.remoteControlPort;
-    c.localAddr = v.localAddr;
-    c.localControlPort = v.localControlPort;
-    c.localVideoAsBwKbps = v.localVideoAsBwKbps;
-    c.remoteVideoAsBwKbps = v.remoteVideoAsBwKbps;
-    return c;
-}
-
 }  // namespace
 
 VPR_Comm StepSyntax::Step::record() const {
@@ -325,16 +295,15 @@ bool StepSyntax::parseLines(std::istream& in, std::vector<Step>* out, std::strin
 
 StepSyntax::Step StepSyntax::fromRecord(const VPR_Comm& record) {
     Step step;
-    step.type = record.type;
-    step.targetModule = record.targetModule;
-    VtspCommand body;
-    memcpy(&body, record.body, sizeof(body));
-    step.rawCode = body.code;
-    if (record.targetModule != VPMD_VIDEO_CMDEVT_TARGET) {
+    const vtspcodec::Trailer trailer = vtspcodec::trailerOf(record);
+    step.type = trailer.type;
+    step.targetModule = trailer.targetModule;
+    step.rawCode = vtspcodec::codeOf(record);
+    if (step.targetModule != VPMD_VIDEO_CMDEVT_TARGET) {
         step.kind = Kind::kRaw;
         return step;
     }
-    switch (body.code) {
+    switch (step.rawCode) {
         case _VTSP_CMD_STREAM_VIDEO_START: step.kind = Kind::kStart; break;
         case _VTSP_CMD_STREAM_VIDEO_MODITY: step.kind = Kind::kModify; break;
         case _VTSP_CMD_STREAM_VIDEO_END: step.kind = Kind::kEnd; break;
@@ -342,11 +311,9 @@ StepSyntax::Step StepSyntax::fromRecord(const VPR_Comm& record) {
         default: step.kind = Kind::kRaw; return step;
     }
     if (step.kind == Kind::kConfig) {
-        step.config.infc = body.infc;
-        step.config.templCode = body.u.config.templCode;
-        memcpy(step.config.data, body.u.config.data, sizeof(step.config.data));
+        step.config = vtspcodec::readConfigCommand(record);
     } else {
-        step.stream = streamFromBody(body);
+        step.stream = vtspcodec::readStreamCommand(record);
     }
     return step;
 }

@@ -6,6 +6,7 @@
 #include <cstring>
 
 #include "CmdBuffer.h"
+#include "WireBytes.h"
 
 namespace vtspcodec {
 
@@ -65,75 +66,129 @@ bool parseEndpoint(const std::string& text, OSAL_NetAddress* out) {
 
 namespace {
 
+using namespace vtspwire;
+
+uint8_t* bytesOf(VPR_Comm& record) { return reinterpret_cast<uint8_t*>(&record); }
+const uint8_t* bytesOf(const VPR_Comm& record) { return reinterpret_cast<const uint8_t*>(&record); }
+
 VPR_Comm emptyRecord(uint32_t type, uint32_t targetModule) {
-    VPR_Comm record{};
-    record.type = type;
-    record.targetModule = targetModule;
-    record.recordLength = kVprCommSize;
+    VPR_Comm record;
+    memset(&record, 0, sizeof(record));
+    putLe32(bytesOf(record), kTypeOffset, type);
+    putLe32(bytesOf(record), kTargetOffset, targetModule);
+    putLe32(bytesOf(record), kLengthOffset, kRecordSize);
     return record;
+}
+
+void putAddress(uint8_t* p, size_t at, const OSAL_NetAddress& a) {
+    for (size_t i = 0; i < 4; ++i) p[at + kAddrIpv4 + i] = a.ipv4[i];
+    for (size_t i = 0; i < 8; ++i) putBe16(p, at + kAddrIpv6 + 2 * i, a.ipv6[i]);
+    putBe16(p, at + kAddrPort, a.port);
+    putLe32(p, at + kAddrType, a.type);
+}
+
+OSAL_NetAddress getAddress(const uint8_t* p, size_t at) {
+    OSAL_NetAddress a{};
+    for (size_t i = 0; i < 4; ++i) a.ipv4[i] = p[at + kAddrIpv4 + i];
+    for (size_t i = 0; i < 8; ++i) a.ipv6[i] = getBe16(p, at + kAddrIpv6 + 2 * i);
+    a.port = getBe16(p, at + kAddrPort);
+    a.type = getLe32(p, at + kAddrType);
+    return a;
 }
 
 }  // namespace
 
 VPR_Comm streamRecord(const StreamCommand& cmd, uint32_t type, uint32_t targetModule) {
     VPR_Comm record = emptyRecord(type, targetModule);
-    VtspCommand body{};
-    body.code = cmd.code;
-    body.infc = cmd.infc;
-    VtspStmVideoView& v = body.u.stmVideo;
-    v.streamId = cmd.streamId;
-    v.dir = cmd.dir;
-    v.encoder = cmd.encoder;
-    v.encodeType[0] = cmd.encodeType[0];
-    v.encodeType[1] = cmd.encodeType[1];
-    v.extension = cmd.extension;
-    v.extmapId = cmd.extmapId;
-    memcpy(v.extmapUri, cmd.extmapUri.data(), std::min(cmd.extmapUri.size(), kExtmapUriSize));
-    v.confMask = cmd.confMask;
-    v.rdnDynType = cmd.rdnDynType;
-    v.remoteAddr = cmd.remoteAddr;
-    v.remoteControlPort = cmd.remoteControlPort;
-    v.localAddr = cmd.localAddr;
-    v.localControlPort = cmd.localControlPort;
-    v.localVideoAsBwKbps = cmd.localVideoAsBwKbps;
-    v.remoteVideoAsBwKbps = cmd.remoteVideoAsBwKbps;
-    // The modem sends ports and IPv6 groups big-endian.
-    swapAddress(v.remoteAddr);
-    swapAddress(v.localAddr);
-    swap16(v.remoteControlPort);
-    swap16(v.localControlPort);
-    memcpy(record.body, &body, sizeof(body));
+    uint8_t* p = bytesOf(record);
+    putLe32(p, kCode, static_cast<uint32_t>(cmd.code));
+    putLe16(p, kInfc, cmd.infc);
+    putLe32(p, kStreamId, cmd.streamId);
+    putLe32(p, kDir, cmd.dir);
+    putLe32(p, kEncoder, cmd.encoder);
+    putLe32(p, kEncodeType, cmd.encodeType[0]);
+    putLe32(p, kEncodeType + 4, cmd.encodeType[1]);
+    putLe32(p, kExtension, cmd.extension);
+    putLe32(p, kExtmapId, cmd.extmapId);
+    memcpy(p + kExtmapUri, cmd.extmapUri.data(), std::min(cmd.extmapUri.size(), kExtmapUriBytes));
+    putLe32(p, kConfMask, cmd.confMask);
+    p[kRdnDynType] = cmd.rdnDynType;
+    putAddress(p, kRemoteAddr, cmd.remoteAddr);
+    putBe16(p, kRemoteControlPort, cmd.remoteControlPort);
+    putAddress(p, kLocalAddr, cmd.localAddr);
+    putBe16(p, kLocalControlPort, cmd.localControlPort);
+    putLe32(p, kLocalBw, cmd.localVideoAsBwKbps);
+    putLe32(p, kRemoteBw, cmd.remoteVideoAsBwKbps);
     return record;
 }
 
 VPR_Comm configRecord(const ConfigCommand& cmd, uint32_t type, uint32_t targetModule) {
     VPR_Comm record = emptyRecord(type, targetModule);
-    VtspCommand body{};
-    body.code = _VTSP_CMD_CONFIG;
-    body.infc = cmd.infc;
-    body.u.config.templCode = cmd.templCode;
-    memcpy(body.u.config.data, cmd.data, sizeof(cmd.data));
-    memcpy(record.body, &body, sizeof(body));
+    uint8_t* p = bytesOf(record);
+    putLe32(p, kCode, static_cast<uint32_t>(_VTSP_CMD_CONFIG));
+    putLe16(p, kInfc, cmd.infc);
+    putLe32(p, kTemplCode, cmd.templCode);
+    for (size_t i = 0; i < 3; ++i) putLe16(p, kConfigData + 2 * i, static_cast<uint16_t>(cmd.data[i]));
     return record;
 }
 
 VPR_Comm commandRecord(int32_t code, uint32_t type, uint32_t targetModule) {
     VPR_Comm record = emptyRecord(type, targetModule);
-    memcpy(record.body, &code, sizeof(code));
+    putLe32(bytesOf(record), kCode, static_cast<uint32_t>(code));
     return record;
 }
 
+Trailer trailerOf(const VPR_Comm& record) {
+    const uint8_t* p = bytesOf(record);
+    return {getLe32(p, kTypeOffset), getLe32(p, kTargetOffset), getLe32(p, kLengthOffset)};
+}
+
+int32_t codeOf(const VPR_Comm& record) { return static_cast<int32_t>(getLe32(bytesOf(record), kCode)); }
+
+StreamCommand readStreamCommand(const VPR_Comm& record) {
+    const uint8_t* p = bytesOf(record);
+    StreamCommand c;
+    c.code = codeOf(record);
+    c.infc = getLe16(p, kInfc);
+    c.streamId = getLe32(p, kStreamId);
+    c.dir = getLe32(p, kDir);
+    c.encoder = getLe32(p, kEncoder);
+    c.encodeType[0] = getLe32(p, kEncodeType);
+    c.encodeType[1] = getLe32(p, kEncodeType + 4);
+    c.extension = getLe32(p, kExtension);
+    c.extmapId = getLe32(p, kExtmapId);
+    const char* uri = reinterpret_cast<const char*>(p + kExtmapUri);
+    c.extmapUri.assign(uri, strnlen(uri, kExtmapUriBytes));
+    c.confMask = getLe32(p, kConfMask);
+    c.rdnDynType = p[kRdnDynType];
+    c.remoteAddr = getAddress(p, kRemoteAddr);
+    c.remoteControlPort = getBe16(p, kRemoteControlPort);
+    c.localAddr = getAddress(p, kLocalAddr);
+    c.localControlPort = getBe16(p, kLocalControlPort);
+    c.localVideoAsBwKbps = getLe32(p, kLocalBw);
+    c.remoteVideoAsBwKbps = getLe32(p, kRemoteBw);
+    return c;
+}
+
+ConfigCommand readConfigCommand(const VPR_Comm& record) {
+    const uint8_t* p = bytesOf(record);
+    ConfigCommand c;
+    c.infc = getLe16(p, kInfc);
+    c.templCode = getLe32(p, kTemplCode);
+    for (size_t i = 0; i < 3; ++i) c.data[i] = static_cast<int16_t>(getLe16(p, kConfigData + 2 * i));
+    return c;
+}
+
 BindRequest readBindRequest(const VPR_Comm& record) {
+    const uint8_t* p = bytesOf(record);
     BindRequest out;
-    VprNetBind body;
-    memcpy(&body, record.body, sizeof(body));
-    swapAddress(body.addr);
-    out.code = body.code;
-    out.streamId = body.streamId;
-    out.addr = body.addr;
-    out.type = record.type;
-    out.targetModule = record.targetModule;
-    out.recordLength = record.recordLength;
+    out.code = getLe32(p, kBindCode);
+    out.streamId = static_cast<int32_t>(getLe32(p, kBindStreamId));
+    out.addr = getAddress(p, kBindAddr);
+    const Trailer t = trailerOf(record);
+    out.type = t.type;
+    out.targetModule = t.targetModule;
+    out.recordLength = t.recordLength;
     return out;
 }
 

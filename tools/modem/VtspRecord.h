@@ -1,6 +1,9 @@
 // Builds and reads modem pipe records the way the modem does: the tools'
 // and the tests' side of the wire. Everything produced here is in wire order
-// (ports and IPv6 groups big-endian), ready to be written into the pipe.
+// (ports and IPv6 groups big-endian), ready to be written into the pipe. The
+// bytes are put and read field by field at their documented offsets
+// (WireBytes.h), never through the system's structures or swaps, so tests
+// that compare with them compare with an independent oracle.
 #ifndef QUELLBORN_TOOLS_VTSPRECORD_H
 #define QUELLBORN_TOOLS_VTSPRECORD_H
 
@@ -55,6 +58,20 @@ struct ConfigCommand {
 VPR_Comm streamRecord(const StreamCommand& cmd, uint32_t type = 0, uint32_t targetModule = 0);
 VPR_Comm configRecord(const ConfigCommand& cmd, uint32_t type = 0, uint32_t targetModule = 0);
 VPR_Comm commandRecord(int32_t code, uint32_t type = 0, uint32_t targetModule = 0);
+
+// The record's trailer, read from its bytes.
+struct Trailer {
+    uint32_t type = 0;
+    uint32_t targetModule = 0;
+    uint32_t recordLength = 0;
+};
+Trailer trailerOf(const VPR_Comm& record);
+// The command code at the start of the body.
+int32_t codeOf(const VPR_Comm& record);
+// A command body read back in host terms (the stream view and the config
+// view of the same bytes).
+StreamCommand readStreamCommand(const VPR_Comm& record);
+ConfigCommand readConfigCommand(const VPR_Comm& record);
 
 // A received bind request, converted to host order.
 struct BindRequest {
