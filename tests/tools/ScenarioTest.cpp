@@ -78,7 +78,7 @@ TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
             {"expect bind local=1.2.3.4:5", "line 1: expected bind stream=N [local=IP:PORT] but found 'local=1.2.3.4:5'"},
             {"expect call", "line 1: expected call TEXT but found end of line"},
             {"wait 70000", "line 1: expected wait 0..60000 (milliseconds) but found '70000'"},
-            {"camera 1", "line 1: expected client, modem, media, wait, expect or a ## heading but found 'camera'"},
+            {"camera 1", "line 1: expected client, modem, media, link, wait, expect or a ## heading but found 'camera'"},
     };
     for (const auto& c : cases) EXPECT_EQ(c.second, errorOf(c.first)) << c.first;
 }
