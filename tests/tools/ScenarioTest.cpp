@@ -65,7 +65,7 @@ TEST(ScenarioParse, EachActorsStepsKeepTheirArguments) {
 TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
     const std::pair<std::string, std::string> cases[] = {
             {"client callback\nclient camrea 1",
-             "line 2: expected a client action (callback, clean-callback, init, surface, clean-surface, camera, size, "
+             "line 2: expected a client action (callback, callback-reentrant, clean-callback, init, surface, clean-surface, camera, size, "
              "orientation, qos, hide, show, release, die, send) but found 'camrea'"},
             {"client camera one", "line 1: expected camera ID but found 'one'"},
             {"client orientation 90 0", "line 1: expected orientation DEVICE SCREEN AUTOROTATE but found end of line"},
