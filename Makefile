@@ -4,7 +4,7 @@ BUILD ?= build
 JOBS ?= $(shell nproc)
 CMAKE_TYPE ?= RelWithDebInfo
 
-.PHONY: deps build sim msc bench test asan tsan sanitizers fuzz fuzz-build fuzz-run coverage mutants clean
+.PHONY: deps build sim msc bench chaos test asan tsan sanitizers fuzz fuzz-build fuzz-run coverage mutants clean
 
 deps:
 	@scripts/install-deps.sh
@@ -29,6 +29,14 @@ msc: build
 bench: build
 	$(BUILD)/vtsp-bench $(BENCH_ARGS)
 
+# Random calls against the real engine with its invariants checked after
+# every step (docs/reliability.md); a violation is shrunk to a scenario in
+# build/chaos/. make chaos SECONDS=3600 for a long run, SEED=N to repeat one.
+SECONDS ?= 60
+chaos: build
+	mkdir -p $(BUILD)/chaos
+	$(BUILD)/vce-sim --chaos --seconds $(SECONDS) $(if $(SEED),--seed $(SEED)) $(if $(ACTORS),--actors $(ACTORS)) --out $(BUILD)/chaos
+
 # The suite, then each fuzz target for a few seconds from its seeds.
 test: build fuzz-build
 	cd $(BUILD) && ctest --output-on-failure -j$(JOBS)
@@ -41,11 +49,15 @@ asan: deps
 	  LSAN_OPTIONS=suppressions=$(CURDIR)/tests/jvm/lsan.supp \
 	  UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
 	  ctest --output-on-failure -j$(JOBS)
+	ASAN_OPTIONS=detect_leaks=1:handle_segv=0 UBSAN_OPTIONS=print_stacktrace=1:halt_on_error=1 \
+	  scripts/chaos-run.sh build-asan
 
 tsan: deps
 	cmake -S . -B build-tsan -DCMAKE_BUILD_TYPE=Debug -DQUELLBORN_TSAN=ON
 	cmake --build build-tsan -j$(JOBS)
 	cd build-tsan && TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1:suppressions=$(CURDIR)/tests/tsan.supp ctest --output-on-failure -j$(JOBS) -LE jvm
+	TSAN_OPTIONS=halt_on_error=1:second_deadlock_stack=1:suppressions=$(CURDIR)/tests/tsan.supp \
+	  scripts/chaos-run.sh build-tsan
 
 sanitizers: asan tsan
 

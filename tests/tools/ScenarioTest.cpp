@@ -70,7 +70,7 @@ TEST(ScenarioParse, EachActorsStepsKeepTheirArguments) {
 TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
     const std::pair<std::string, std::string> cases[] = {
             {"client callback\nclient camrea 1",
-             "line 2: expected a client action (callback, clean-callback, init, surface, clean-surface, camera, size, "
+             "line 2: expected a client action (callback, callback-reentrant, clean-callback, init, surface, clean-surface, camera, size, "
              "orientation, qos, hide, show, release, die, send) but found 'camrea'"},
             {"client camera one", "line 1: expected camera ID but found 'one'"},
             {"client orientation 90 0", "line 1: expected orientation DEVICE SCREEN AUTOROTATE but found end of line"},
@@ -83,7 +83,7 @@ TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
             {"expect bind local=1.2.3.4:5", "line 1: expected bind stream=N [local=IP:PORT] but found 'local=1.2.3.4:5'"},
             {"expect call", "line 1: expected call TEXT but found end of line"},
             {"wait 70000", "line 1: expected wait 0..60000 (milliseconds) but found '70000'"},
-            {"camera 1", "line 1: expected client, modem, media, wait, dump, expect or a ## heading but found 'camera'"},
+            {"camera 1", "line 1: expected client, modem, media, link, wait, dump, expect or a ## heading but found 'camera'"},
             {"expect dump", "line 1: expected dump TEXT but found end of line"},
     };
     for (const auto& c : cases) EXPECT_EQ(c.second, errorOf(c.first)) << c.first;

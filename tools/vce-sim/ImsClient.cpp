@@ -73,10 +73,13 @@ void ImsClient::transact(uint32_t code, const std::string& label, const std::vec
     for (int32_t v : ints) request.writeInt32(v);
     if (binder != nullptr) request.writeStrongBinder(binder);
     if (text != nullptr) request.writeCString(text);
+    if (binder == nullptr) mPreviousCallback.store(mCurrentCallback.load());
     const status_t status = mService->transact(code, request, &reply);
+    if (binder == nullptr) noteCallbackChange(code);
     reply.setDataPosition(0);
-    mLastReply = reply.readInt32();
-    const std::string result = reply.dataSize() >= sizeof(int32_t) ? "<- reply " + std::to_string(mLastReply)
+    const int32_t answer = reply.readInt32();
+    mLastReply.store(answer);
+    const std::string result = reply.dataSize() >= sizeof(int32_t) ? "<- reply " + std::to_string(answer)
                                                                    : "<- no reply";
     show(status == android::NO_ERROR ? result : result + ", status " + std::to_string(status), "vce", "client");
 }
@@ -91,6 +94,8 @@ void ImsClient::perform(const ScenarioStep& step) {
     }
     if (step.verb == "callback") {
         setCallback();
+    } else if (step.verb == "callback-reentrant") {
+        setCallback(step.ints[0]);
     } else if (step.verb == "surface") {
         setSurface(step);
     } else if (step.verb == "hide") {
@@ -106,11 +111,32 @@ void ImsClient::perform(const ScenarioStep& step) {
     }
 }
 
-void ImsClient::setCallback() {
+void ImsClient::setCallback(int32_t reentrantCode) {
+    const int generation = ++mCallbackGeneration;
     mCallback = new RemoteBinder(
-            [this](uint32_t code, const Parcel& data, Parcel* reply, uint32_t) { return receive(code, data, reply); },
+            [this, generation, reentrantCode](uint32_t code, const Parcel& data, Parcel* reply, uint32_t) {
+                return receive(code, data, reply, generation, reentrantCode);
+            },
             android::String16("android.videocallengine.callback"));
-    transact(VideoCallEngineService::VCE_ACTION_SET_CALLBACK, "SET_CALLBACK", {}, mCallback);
+    // While the engine swaps callbacks, an event may still reach the old one.
+    mPreviousCallback.store(mCurrentCallback.load());
+    mCurrentCallback.store(generation);
+    transact(VideoCallEngineService::VCE_ACTION_SET_CALLBACK,
+             reentrantCode < 0 ? "SET_CALLBACK" : "SET_CALLBACK (answers events with code " +
+                                                          std::to_string(reentrantCode) + ")",
+             {}, mCallback);
+    mPreviousCallback.store(0);
+}
+
+void ImsClient::noteCallbackChange(uint32_t code) {
+    // Without a binder, SET_CALLBACK clears the callback as CLEAN_CALLBACK
+    // does; RELEASE drops it too.
+    if (code == VideoCallEngineService::VCE_ACTION_SET_CALLBACK ||
+        code == VideoCallEngineService::VCE_ACTION_CLEAN_CALLBACK ||
+        code == VideoCallEngineService::VCE_ACTION_RELEASE) {
+        mCurrentCallback.store(0);
+    }
+    mPreviousCallback.store(0);
 }
 
 void ImsClient::setSurface(const ScenarioStep& step) {
@@ -121,10 +147,13 @@ void ImsClient::setSurface(const ScenarioStep& step) {
 
 void ImsClient::die() {
     show("x  process dies (callback binder killed)", "client", "vce");
+    mCurrentCallback.store(0);
     if (mCallback != nullptr) mCallback->kill();
 }
 
-status_t ImsClient::receive(uint32_t code, const Parcel& data, Parcel* reply) {
+status_t ImsClient::receive(uint32_t code, const Parcel& data, Parcel* reply, int generation,
+                           int32_t reentrantCode) {
+    if (generation != mCurrentCallback.load() && generation != mPreviousCallback.load()) mStaleEvents.fetch_add(1);
     Event event;
     event.event = data.readInt32();
     if (code == 1) {
@@ -136,6 +165,12 @@ status_t ImsClient::receive(uint32_t code, const Parcel& data, Parcel* reply) {
     }
     show("<- event " + std::to_string(event.event) + " (" + eventName(event.event) + ")" + joined(event.values), "vce",
          "client");
+    // A client that answers an event by calling the service again, from the
+    // handler: the binder driver runs that call on the notifying thread.
+    if (reentrantCode >= 0) {
+        transact(static_cast<uint32_t>(reentrantCode), "code " + std::to_string(reentrantCode) + " from the handler",
+                 {});
+    }
     reply->writeInt32(0);
     return android::NO_ERROR;
 }

@@ -8,6 +8,7 @@
 #include <binder/IBinder.h>
 #include <utils/StrongPointer.h>
 
+#include <atomic>
 #include <cstdint>
 #include <mutex>
 #include <string>
@@ -32,19 +33,27 @@ public:
     void perform(const ScenarioStep& step);
 
     // The reply integer of the last transaction (0 when none came back).
-    int32_t lastReply() const { return mLastReply; }
+    int32_t lastReply() const { return mLastReply.load(); }
     std::vector<Event> eventsSince(size_t from) const;
     size_t eventCount() const;
+    // Events that reached a callback the client had already replaced,
+    // cleaned or lost with its process: the engine should never send those.
+    size_t staleEvents() const { return mStaleEvents.load(); }
+    // True while the client believes a callback of its own is registered.
+    bool hasCallback() const { return mCurrentCallback.load() != 0; }
 
     static const char* eventName(int32_t event);
 
 private:
     void transact(uint32_t code, const std::string& label, const std::vector<int32_t>& ints,
                   const android::sp<android::IBinder>& binder = nullptr, const char* text = nullptr);
-    void setCallback();
+    void setCallback(int32_t reentrantCode = -1);
+    // What a transaction of `code` does to the registered callback.
+    void noteCallbackChange(uint32_t code);
     void setSurface(const ScenarioStep& step);
     void die();
-    android::status_t receive(uint32_t code, const android::Parcel& data, android::Parcel* reply);
+    android::status_t receive(uint32_t code, const android::Parcel& data, android::Parcel* reply, int generation,
+                              int32_t reentrantCode);
     void show(const std::string& text, const std::string& mscFrom, const std::string& mscTo,
               const std::string& target = "");
 
@@ -52,9 +61,13 @@ private:
     android::sp<android::IBinder> mService;
     android::sp<hostbinder::RemoteBinder> mCallback;
     android::sp<hostbinder::RemoteBinder> mSurfaces[2];
-    int32_t mLastReply = 0;
+    std::atomic<int32_t> mLastReply{0};  // a handler may transact from the notifying thread
     mutable std::mutex mLock;
     std::vector<Event> mEvents;
+    std::atomic<int> mCurrentCallback{0};  // generation of the registered callback; 0 none
+    std::atomic<int> mPreviousCallback{0};  // still allowed while a callback change is in flight
+    int mCallbackGeneration = 0;
+    std::atomic<size_t> mStaleEvents{0};
 };
 
 #endif  // QUELLBORN_TOOLS_VCESIM_IMSCLIENT_H

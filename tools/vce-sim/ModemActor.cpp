@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
 
 #include "RecordDecoder.h"
@@ -32,11 +33,32 @@ void ModemActor::send(const StepSyntax::Step& step) {
     mPty.writeRecord(record);
 }
 
+namespace {
+
+int64_t nowNs() {
+    return std::chrono::duration_cast<std::chrono::nanoseconds>(std::chrono::steady_clock::now().time_since_epoch())
+            .count();
+}
+
+}  // namespace
+
+void ModemActor::stall(int milliseconds) {
+    mStallUntilNs.store(nowNs() + int64_t{milliseconds} * 1000000);
+}
+
+bool ModemActor::stalled() const {
+    return nowNs() < mStallUntilNs.load() + 200 * 1000000LL;
+}
+
 void ModemActor::readLoop() {
     // Bytes are gathered across polls: a record may arrive in pieces.
     VPR_Comm record;
     size_t got = 0;
     while (!mStop.load()) {
+        if (nowNs() < mStallUntilNs.load()) {
+            usleep(5 * 1000);
+            continue;
+        }
         struct pollfd pfd {mPty.masterFd(), POLLIN, 0};
         const int ready = poll(&pfd, 1, 20);
         if (ready <= 0 || (pfd.revents & POLLIN) == 0) {

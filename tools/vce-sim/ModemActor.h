@@ -26,6 +26,12 @@ public:
     // Writes the step's record into the pipe.
     void send(const StepSyntax::Step& step);
 
+    // Stops reading the pipe for a while, as a busy modem does: the link's
+    // writes then wait for room.
+    void stall(int milliseconds);
+    // True while a stall lasts, and a moment after, while the pipe drains.
+    bool stalled() const;
+
     // Records the link wrote, oldest first, from index `from` on.
     std::vector<android::VPR_Comm> recordsSince(size_t from) const;
     size_t recordCount() const;
@@ -39,6 +45,7 @@ private:
     mutable std::mutex mLock;
     std::vector<android::VPR_Comm> mRecords;
     std::atomic<bool> mStop{false};
+    std::atomic<int64_t> mStallUntilNs{0};
     std::thread mReader;  // last: starts once everything above exists
 };
 

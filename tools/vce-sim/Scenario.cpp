@@ -23,6 +23,7 @@ struct VerbSpec {
 
 const VerbSpec kClientVerbs[] = {
         {"callback", "", Args::kNone, 0, 0},
+        {"callback-reentrant", "CODE", Args::kInts, 1, 1},
         {"clean-callback", "", Args::kNone, 0, 0},
         {"init", "[loopback]", Args::kInitFlag, 0, 0},
         {"surface", "remote|local", Args::kView, 0, 0},
@@ -47,6 +48,13 @@ const VerbSpec kMediaVerbs[] = {
         {"event", "N [WORD1 ...]", Args::kInts, 1, 16},
         {"remote-size", "WIDTH HEIGHT", Args::kInts, 2, 2},
         {"zmf", "EVENT JSON", Args::kIntThenText, 1, 1},
+};
+
+const VerbSpec kLinkVerbs[] = {
+        {"stop", "", Args::kNone, 0, 0},
+        {"start", "", Args::kNone, 0, 0},
+        {"restart", "", Args::kNone, 0, 0},
+        {"stall", "MILLISECONDS", Args::kInts, 1, 1},
 };
 
 const VerbSpec kExpectVerbs[] = {
@@ -202,6 +210,16 @@ bool parseLine(TokenCursor& cursor, ScenarioStep* step, std::string* error) {
         cursor.next();
         return readVerb(cursor, kMediaVerbs, "media event", step, error);
     }
+    if (actor == "link") {
+        step->actor = Actor::kLink;
+        cursor.next();
+        if (!readVerb(cursor, kLinkVerbs, "link action", step, error)) return false;
+        if (step->verb == "stall" && (step->ints[0] < 0 || step->ints[0] > 60000)) {
+            *error = TokenCursor::expected("stall 0..60000 (milliseconds)", std::to_string(step->ints[0]));
+            return false;
+        }
+        return true;
+    }
     if (actor == "expect") {
         step->actor = Actor::kExpect;
         cursor.next();
@@ -229,7 +247,7 @@ bool parseLine(TokenCursor& cursor, ScenarioStep* step, std::string* error) {
         }
         return true;
     }
-    *error = cursor.expected("client, modem, media, wait, dump, expect or a ## heading");
+    *error = cursor.expected("client, modem, media, link, wait, dump, expect or a ## heading");
     return false;
 }
 

@@ -12,7 +12,7 @@
 #include "StepSyntax.h"
 
 struct ScenarioStep {
-    enum class Actor { kHeading, kClient, kModem, kMedia, kWait, kExpect, kDump };
+    enum class Actor { kHeading, kClient, kModem, kMedia, kLink, kWait, kExpect, kDump };
     Actor actor = Actor::kHeading;
     int line = 0;
     std::string source;         // the line as written, without comment

@@ -52,6 +52,7 @@ Simulator::Simulator(const Options& options, std::ostream& out)
       mServiceRegistered(startService()),
       mClient(&mTimeline),
       mPrinter(out, options.verbose, options.colour),
+      mInvariants(options.invariants),
       mVerbose(options.verbose) {
     harvestCalls(Actor::kClient);
     mPrinter.print(mTimeline.takeNew());
@@ -101,7 +102,13 @@ std::vector<std::string> Simulator::play(const Scenario& scenario) {
                  (found.empty() ? "ok      " : "FAILED  ") + TokenCursor(step.source).restAfterFirst());
             if (!found.empty()) failures.push_back("line " + std::to_string(step.line) + ": " + step.source + ": " + found);
         } else {
-            run(step);
+            const std::string violated = this->step(step);
+            if (!violated.empty()) {
+                note(Kind::kExpectFailed, "check", "FAILED  " + violated);
+                failures.push_back("line " + std::to_string(step.line) + ": " + step.source + ": " + violated);
+                mPrinter.print(mTimeline.takeNew());
+                break;
+            }
         }
         mPrinter.print(mTimeline.takeNew());
     }
@@ -144,6 +151,7 @@ void Simulator::run(const ScenarioStep& step) {
         case Actor::kModem: mModem.send(step.modem); break;
         case Actor::kMedia: mMedia.perform(step); break;
         case Actor::kDump: dump(step.text); break;
+        case Actor::kLink: runLink(step); break;
         case Actor::kWait:
             note(Kind::kStep, "wait", std::to_string(step.ints[0]) + " ms");
             std::this_thread::sleep_for(std::chrono::milliseconds(step.ints[0]));
@@ -152,6 +160,50 @@ void Simulator::run(const ScenarioStep& step) {
     }
     settle();
     harvestCalls(step.actor);
+}
+
+std::string Simulator::step(const ScenarioStep& step) {
+    mStartFoundStream = step.actor == Actor::kModem && step.modem.kind == StepSyntax::Kind::kStart &&
+                        android::VtspManager::getInstance()->mCmdCallback->stream(step.modem.stream.streamId) != nullptr;
+    // The client's death reaches the engine only through the death link of
+    // a callback it still has registered.
+    mDeathEndsCall = step.actor == Actor::kClient && step.verb == "die" && mClient.hasCallback();
+    run(step);
+    return mInvariants ? checkInvariants(step) : "";
+}
+
+void Simulator::perform(const ScenarioStep& step) {
+    const int actor = step.actor == Actor::kClient ? 0 : step.actor == Actor::kModem ? 1 : step.actor == Actor::kMedia ? 2 : 3;
+    std::lock_guard<std::mutex> lock(mActorLocks[actor]);
+    switch (step.actor) {
+        case Actor::kClient: mClient.perform(step); break;
+        case Actor::kModem: mModem.send(step.modem); break;
+        case Actor::kMedia: mMedia.perform(step); break;
+        case Actor::kLink: runLink(step); break;
+        case Actor::kDump: dump(step.text); break;
+        default: break;
+    }
+}
+
+void Simulator::runLink(const ScenarioStep& step) {
+    android::VtspManager* link = android::VtspManager::getInstance();
+    if (step.verb == "stall") {
+        note(Kind::kStep, "modem", "stops reading the pipe for " + std::to_string(step.ints[0]) + " ms");
+        mModem.stall(step.ints[0]);
+        return;
+    }
+    note(Kind::kStep, "host", "VtspManager::" + step.verb + "()");
+    if (step.verb == "stop") {
+        link->stop();
+        mLinkStopped = true;
+    } else if (step.verb == "start") {
+        link->start();
+        mLinkStopped = false;
+    } else {
+        link->destroy();
+        link->init();
+        mLinkStopped = false;
+    }
 }
 
 void Simulator::settle() {
