@@ -71,7 +71,14 @@ VideoCallEngineImpl::VideoCallEngineImpl()
           mLoopback(false),
           mLoopbackStream(0),
           mVtspManager(nullptr) {
-    pthread_mutex_init(&mLock, nullptr);
+    // Recursive: a client's handler that calls back during a notification
+    // (run by the binder driver on the notifying thread) changes the callback
+    // on the thread that holds mLock.
+    pthread_mutexattr_t recursive;
+    pthread_mutexattr_init(&recursive);
+    pthread_mutexattr_settype(&recursive, PTHREAD_MUTEX_RECURSIVE);
+    pthread_mutex_init(&mLock, &recursive);
+    pthread_mutexattr_destroy(&recursive);
     mVtspManager = VtspManager::getInstance();
     LOGI("Construct");
     mVtspManager->init();
@@ -131,44 +138,39 @@ void VideoCallEngineImpl::init(int loopback) {
 }
 
 void VideoCallEngineImpl::setNotifyCallback(const sp<IVideoCallEngineCallback>& callback) {
-    std::lock_guard<std::mutex> change(mCallbackChangeLock);
     LOGI("%s, callback %p", "setNotifyCallback", callback.get());
-    // Only callback changes write the callback, and they hold
-    // mCallbackChangeLock, so it can be tested here without mLock.
+    // Held throughout, so a change waits for the notification in progress and
+    // the missing release and the new callback are one step for other threads.
+    ScopedPthreadLock lock(mLock);
     if (callback != nullptr && mNotifyCallback != nullptr) {
         LOGI("VCE is not released as expected");
-        releaseCall();
+        release();
     }
-    ScopedPthreadLock lock(mLock);
     mNotifyCallback = callback;
 }
 
 void VideoCallEngineImpl::release() {
-    std::lock_guard<std::mutex> change(mCallbackChangeLock);
-    releaseCall();
-}
-
-void VideoCallEngineImpl::releaseCall() {
-    {
-        std::lock_guard<std::recursive_mutex> op(mOpLock);
-        LOGI("release");
-        mAutoRotate = 1;
-        mDeviceOrientation = 0;
-        mScreenOrientation = 0;
-        mRemoteRotation = 0;
-        setRemoteSurface(nullptr);
-        setPreviewSurface(nullptr);
-        setCameraId(-1);
-        if (mLoopback) stopLoopBack();
-    }
-    // Waiting for a notification in progress without mOpLock: the client's
-    // handler may call back into the engine before it returns (the binder
-    // driver runs such a call on the notifying thread), and that call needs mOpLock.
+    releaseMedia();
+    // Only dropping the callback waits for a notification in progress: the
+    // call's media ends at once even when the client's handler is stuck.
     {
         ScopedPthreadLock lock(mLock);
         mNotifyCallback.clear();
     }
     LOGI("release X");
+}
+
+void VideoCallEngineImpl::releaseMedia() {
+    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    LOGI("release");
+    mAutoRotate = 1;
+    mDeviceOrientation = 0;
+    mScreenOrientation = 0;
+    mRemoteRotation = 0;
+    setRemoteSurface(nullptr);
+    setPreviewSurface(nullptr);
+    setCameraId(-1);
+    if (mLoopback) stopLoopBack();
 }
 
 int VideoCallEngineImpl::notifyLocked(int event, const int* args) {
@@ -177,12 +179,15 @@ int VideoCallEngineImpl::notifyLocked(int event, const int* args) {
         LOGI("notifyCallback null");
         return -1;
     }
-    // The client's handler runs while mLock is held, so a callback change
-    // waits for the notification and never races it.
+    // The client's handler runs while mLock is held, so a change from another
+    // thread waits for the notification. A change the handler makes itself
+    // may drop mNotifyCallback meanwhile; this reference keeps the object
+    // being called alive until the call returns.
+    const sp<IVideoCallEngineCallback> callback = mNotifyCallback;
     if (args == nullptr) {
-        mNotifyCallback->notifyCallback(event);
+        callback->notifyCallback(event);
     } else {
-        mNotifyCallback->notifyCallback(event, args[0], args[1], args[2]);
+        callback->notifyCallback(event, args[0], args[1], args[2]);
     }
     return 0;
 }

@@ -5,6 +5,7 @@
 #include <gui/IGraphicBufferProducer.h>
 #include <utils/String16.h>
 
+#include "ScopedPthreadLock.h"
 #include "VideoCallEngineImpl.h"
 
 namespace android {
@@ -158,6 +159,7 @@ void VideoCallEngineService::setSurface(const Parcel& data, Parcel* reply) {
 
 void VideoCallEngineService::setCallback(const Parcel& data) {
     LOGI("VCE_ACTION_SET_CALLBACK");
+    ScopedPthreadLock notifications(mVideoCallEngineImpl->mLock);
     std::lock_guard<std::mutex> lock(mCallbackLock);
     // The previous client's death link stays: its death still releases the engine.
     mCallback = IVideoCallEngineCallback::asInterface(data.readStrongBinder());
@@ -169,6 +171,7 @@ void VideoCallEngineService::setCallback(const Parcel& data) {
 
 void VideoCallEngineService::cleanCallback() {
     LOGI("VCE_ACTION_CLEAN_CALLBACK");
+    ScopedPthreadLock notifications(mVideoCallEngineImpl->mLock);
     std::lock_guard<std::mutex> lock(mCallbackLock);
     if (mCallback != nullptr) {
         IInterface::asBinder(mCallback)->unlinkToDeath(this, nullptr, 0, nullptr);
