@@ -83,8 +83,7 @@ TEST_F(ServiceTest, EachCodeReadsItsFieldsAnswersAndReachesItsOperation) {
             {kHideImage, {2}, {hideLine}, {shownLine}, 0, false, image},
             {kHideImage, {}, {hideLine}, {shownLine}},
             // Hide 1 without the name: nothing to send instead of the camera.
-            {kHideImage, {1}, {hideLine, "E VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused"}, {},
-             BAD_VALUE},
+            {kHideImage, {1}, {hideLine, "E VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused"}, {}},
             // Nothing left to end.
             {kRelease, {}, {"I VCE_ACTION_RELEASE"},
              {"I release", "I setRemoteSurface", "I setRemoteSurface null", "I setRemoteSurface X",

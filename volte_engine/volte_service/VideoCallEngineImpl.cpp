@@ -121,9 +121,9 @@ int VideoCallEngineImpl::initMme() {
 void VideoCallEngineImpl::init(int loopback) {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("init, loopback? %d E", loopback);
-    // A loopback stream the previous call left open would otherwise run on
-    // with nothing left to close it.
-    if (mLoopbackStream != 0) stopLoopBack();
+    // A loopback init over an open loopback stream would leave the old one
+    // running with nothing left to close it; a normal init leaves it to release.
+    if (loopback != 0 && mLoopbackStream != 0) stopLoopBack();
     mLoopback = loopback != 0;
     mCameraId = -1;
     mUplinkQos = 0;
@@ -170,7 +170,8 @@ void VideoCallEngineImpl::releaseMedia() {
     setRemoteSurface(nullptr);
     setPreviewSurface(nullptr);
     setCameraId(-1);
-    if (mLoopback) stopLoopBack();
+    // Also a stream left open by a normal init after a loopback one.
+    if (mLoopback || mLoopbackStream != 0) stopLoopBack();
 }
 
 int VideoCallEngineImpl::notifyLocked(int event, const int* args) {

@@ -123,8 +123,8 @@ status_t VideoCallEngineService::onTransact(uint32_t code, const Parcel& data, P
             break;
         }
         case VCE_ACTION_HIDE_LOCAL_IMAGE:
-            hideLocalImage(data, reply);
-            return NO_ERROR;
+            hideLocalImage(data);
+            break;
         case VCE_ACTION_SET_UPLINK_QOS:
             LOGI("VCE_ACTION_SET_UPLINK_QOS");
             engine->setUplinkQos(data.readInt32());
@@ -191,18 +191,18 @@ void VideoCallEngineService::cleanSurface(const Parcel& data) {
     }
 }
 
-void VideoCallEngineService::hideLocalImage(const Parcel& data, Parcel* reply) {
+void VideoCallEngineService::hideLocalImage(const Parcel& data) {
     LOGI("VCE_ACTION_HIDE_LOCAL_IMAGE");
     const bool hide = data.readInt32() == kHide;
     const char* path = hide ? data.readCString() : nullptr;
     if (hide && path == nullptr) {
-        // A truncated request: there is no image to send in the camera's place.
+        // A truncated request: there is no image to send in the camera's
+        // place, and the media engine must never get a null path. It is
+        // answered as every request handled here is.
         LOGE("VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused");
-        reply->writeInt32(BAD_VALUE);
         return;
     }
     mVideoCallEngineImpl->hideLocalImage(hide, path);
-    reply->writeInt32(0);
 }
 
 }  // namespace android
