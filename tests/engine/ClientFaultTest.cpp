@@ -229,6 +229,27 @@ TEST_F(ClientFaultTest, SlowRenderRemovalsNeverTakeAwayRendersSetAgain) {
     EXPECT_EQ(2u, Surface::liveCount());
 }
 
+// The render library never finishes taking a render away: adding that render
+// again waits a bounded time, and no other request waits for it at all.
+TEST_F(ClientFaultTest, AHungRenderRemovalStallsNoOtherRequest) {
+    setSurface(kRemoteView);
+    hostfakes::setRenderRemoveDelayMs(24 * 3600 * 1000);
+    cleanSurface(kRemoteView);
+    auto again = onThread([this] { return send(kSetSurface, {kRemoteView}, enginetest::remoteProducer()); });
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kEngineTag, "setRemoteSurface add Render"));
+    auto others = onThread([this] {
+        EXPECT_EQ(0, setCamera(1));
+        orient(90, 1, 1);
+        return send(kUplinkQos, {500});
+    });
+    const bool answered = finishes(others) && finishes(again);
+    hostfakes::setRenderRemoveDelayMs(0);  // the library's call returns at last
+    ASSERT_TRUE(answered) << "a request waited for the hung removal";
+    EXPECT_EQ(0, others.get());
+    EXPECT_EQ(0, again.get());
+    EXPECT_TRUE(logged("addRender, removal of Remote still pending, adding it anyway", ANDROID_LOG_ERROR));
+}
+
 // A handler that calls back into the engine (the binder driver runs such a
 // call on the notifying thread) while another client thread releases: the
 // release waits for the notification, the handler's call does not wait for
