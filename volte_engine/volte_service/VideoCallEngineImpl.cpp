@@ -86,15 +86,13 @@ VideoCallEngineImpl::VideoCallEngineImpl()
 
 VideoCallEngineImpl::~VideoCallEngineImpl() {
     LOGI("Destruct");
+    // The event paths keep raw pointers to their observer: a deleted engine
+    // must not be called back, nor be freed under an event already inside it.
+    unregisterZmfEventObserver(this);
+    unregisterMmeEventObserver(this);
     camdrvTerm();
     renderTerm();
     zmfTerminate();
-    // The event paths keep raw pointers to their observer: a deleted engine
-    // must not be called back.
-    ZmfEventObserver* self = this;
-    m_pZmfEventObserver.compare_exchange_strong(self, nullptr);
-    MmeEventObserver* mmeSelf = this;
-    m_pMmeEventObserver.compare_exchange_strong(mmeSelf, nullptr);
     {
         ScopedPthreadLock lock(mLock);
         mNotifyCallback.clear();

@@ -5,6 +5,7 @@
 #include <cstring>
 #include <vector>
 
+#include "ObserverCalls.h"
 #include "Zmf.h"
 
 __attribute__((visibility("default"))) unsigned char _zmf = 0;
@@ -100,6 +101,16 @@ bool scanEvent(int event, const char* json, EventValues& v) {
 
 std::atomic<ZmfEventObserver*> m_pZmfEventObserver{nullptr};
 
+namespace {
+
+ObserverCalls& observerCalls() {
+    // The listener thread may still call while the process exits.
+    static auto* calls = new ObserverCalls();
+    return *calls;
+}
+
+}  // namespace
+
 void zmfInitialize() {
     LOGI("%s", "zmfInitialize");
     if (__atomic_load_n(&_zmf, __ATOMIC_ACQUIRE) != 0) return;
@@ -124,6 +135,10 @@ int registerZmfEventObserver(ZmfEventObserver* observer) {
     return 0;
 }
 
+void unregisterZmfEventObserver(ZmfEventObserver* observer) {
+    observerCalls().unregister(m_pZmfEventObserver, observer);
+}
+
 void listen(int event, const char* json, int /*arg*/) {
     LOGI("%s, Evt:%s=%s", "listen", Zmf_GetEventName(event), json != nullptr ? json : "(null)");
     if (event < kFirstEvent || event > kLastEvent) return;
@@ -135,6 +150,7 @@ void listen(int event, const char* json, int /*arg*/) {
     EventValues v(json);
     if (!scanEvent(event, json, v)) return;
 
+    ObserverCalls::Call call(observerCalls());
     ZmfEventObserver* observer = m_pZmfEventObserver.load();
     if (observer == nullptr) return;
     switch (event) {
