@@ -259,3 +259,23 @@ TEST_F(ServiceTest, TheEngineOutlivesTheEventsInsideItWhenItIsDeleted) {
         service = defaultServiceManager()->checkService(kServiceName);
     }
 }
+
+// Service objects made and dropped on several threads at once, with no other
+// holding the engine: each sees a live engine, and every engine made is deleted.
+TEST_F(ServiceTest, ServiceObjectsComingAndGoingAtOnceShareOnlyLiveEngines) {
+    ASSERT_EQ(NO_ERROR, defaultServiceManager()->addService(kServiceName, new BBinder()));
+    service.clear();
+    constexpr int kRounds = 2000;
+    auto churn = [] {
+        for (int i = 0; i < kRounds; ++i) {
+            sp<VideoCallEngineService> transient = new VideoCallEngineService();
+            ASSERT_EQ(-1, transient->mVideoCallEngineImpl->mOpenCameraId);
+        }
+    };
+    std::vector<std::thread> others;
+    for (int t = 0; t < 3; ++t) others.emplace_back(churn);
+    churn();
+    for (std::thread& t : others) t.join();
+    EXPECT_EQ(count(kEngineTag, "Construct"), count(kEngineTag, "Destruct"));
+    EXPECT_EQ(nullptr, m_pMmeEventObserver.load());
+}

@@ -28,8 +28,7 @@ int gInstanceUsers = 0;
 
 VideoCallEngineImpl* VideoCallEngineImpl::sInstance = nullptr;
 
-VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
-    std::lock_guard<std::mutex> lock(gInstanceLock);
+VideoCallEngineImpl* VideoCallEngineImpl::instanceLocked() {
     if (sInstance == nullptr) {
         LOGI("Create new Instance");
         sInstance = new VideoCallEngineImpl();
@@ -37,9 +36,16 @@ VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
     return sInstance;
 }
 
-VideoCallEngineImpl* VideoCallEngineImpl::acquireInstance() {
-    VideoCallEngineImpl* engine = getInstance();
+VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
     std::lock_guard<std::mutex> lock(gInstanceLock);
+    return instanceLocked();
+}
+
+VideoCallEngineImpl* VideoCallEngineImpl::acquireInstance() {
+    // Looked up and counted in one step: a release in between would delete
+    // the engine about to be handed out.
+    std::lock_guard<std::mutex> lock(gInstanceLock);
+    VideoCallEngineImpl* engine = instanceLocked();
     ++gInstanceUsers;
     return engine;
 }

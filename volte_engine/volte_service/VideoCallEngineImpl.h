@@ -119,6 +119,8 @@ public:
     VtspManager* mVtspManager;
 
 private:
+    // getInstance() for a caller that holds the instance lock.
+    static VideoCallEngineImpl* instanceLocked();
     int cameraAngle() const;
     int displayAngle() const;
     int notifyLocked(int event, const int* args);
