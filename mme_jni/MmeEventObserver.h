@@ -15,6 +15,11 @@ public:
 
 // Stores the observer (null unregisters); returns 0.
 int registerMmeEventObserver(MmeEventObserver* observer);
+// Takes `observer` away if it is the one registered and waits for the event
+// calls that reached it already: it may be deleted once this returns.
+void unregisterMmeEventObserver(MmeEventObserver* observer);
+// Calls `observer->mmeEvtUpdate(event)` on the registered observer; false if there is none.
+bool forwardMmeEvent(int event);
 
 // Read by the media engine's event thread while binder threads may register:
 // an atomic keeps the hand-over clean.

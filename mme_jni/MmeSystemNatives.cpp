@@ -137,9 +137,11 @@ jint cfgSetAppCtx(JNIEnv* env, jclass, jobject context) {
 }
 
 jstring mmeGetVer(JNIEnv* env, jclass) {
+    // Each library is asked once, the video library first.
+    const char* melon = Melon_GetVersion();
+    const char* mme = Mme_GetVer();
     char version[kVersionSize];
-    snprintf(version, sizeof(version), "%s|%s", Melon_GetVersion() != nullptr ? Melon_GetVersion() : "",
-             Mme_GetVer() != nullptr ? Mme_GetVer() : "");
+    snprintf(version, sizeof(version), "%s|%s", melon != nullptr ? melon : "", mme != nullptr ? mme : "");
     trimPartialCharacter(version);
     LOGI("%s, %s", "mmeGetVer", version);
     return newJavaString(env, version);

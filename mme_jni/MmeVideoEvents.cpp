@@ -110,12 +110,9 @@ extern "C" int Mvd_EvntProc(tagMVD_EVNT* event, unsigned int /*cookie*/) {
                                         word(*event, kWordOrient3));
         case EN_MVD_EVNT_STRM_RTP_FIRST_PKT:
         case EN_MVD_EVNT_STRM_RTP_BREAK:
-        case EN_MVD_EVNT_STRM_RTP_RECVED: {
-            MmeEventObserver* observer = m_pMmeEventObserver.load();
-            if (observer == nullptr) return number;
-            observer->mmeEvtUpdate(number);
-            return 0;  // handled, as for the other forwarded events
-        }
+        case EN_MVD_EVNT_STRM_RTP_RECVED:
+            // Handled answers 0, as for the other forwarded events.
+            return forwardMmeEvent(number) ? 0 : number;
         case EN_MVD_EVNT_STRM_RTPEXT_APP:
             return JniMvdMagnViewChanged(word(*event, kWordMagnView));
         default:

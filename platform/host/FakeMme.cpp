@@ -94,13 +94,23 @@ int Mme_CfgSetLogLevel(unsigned int iLevel) { return recordCall("Mme_CfgSetLogLe
 int Mme_CfgSetLogLevelX(unsigned int iLevel) { return recordCall("Mme_CfgSetLogLevelX", {argText(iLevel)}); }
 
 const char* Mme_GetVer(void) {
-    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
-    return lookup(state().mmeVersion);
+    const char* text = nullptr;
+    {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        text = lookup(state().mmeVersion);
+    }
+    recordCall("Mme_GetVer", {"-> " + argText(text)});
+    return text;
 }
 
 const char* Melon_GetVersion(void) {
-    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
-    return lookup(state().melonVersion);
+    const char* text = nullptr;
+    {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        text = lookup(state().melonVersion);
+    }
+    recordCall("Melon_GetVersion", {"-> " + argText(text)});
+    return text;
 }
 
 int Mme_ProvGetValueBool(const char* pcKey) {

@@ -47,8 +47,11 @@ RenderState& state() {
 }  // namespace
 
 void setRenderRemoveDelayMs(int ms) {
-    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
-    state().removeDelayMs = ms;
+    {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        state().removeDelayMs = ms;
+    }
+    removed().notify_all();
 }
 
 std::vector<std::string> activeRenders() {
@@ -92,12 +95,12 @@ int renderRotate(const char* pcRenderId, int iAngle) {
 
 int renderRemove(const char* pcRenderId) {
     CallRecorder& r = CallRecorder::instance();
-    int delayMs;
     {
-        std::lock_guard<std::mutex> lock(r.stateMutex());
-        delayMs = state().removeDelayMs;
+        // A slow library; setting the delay back to 0 lets a hung call return.
+        std::unique_lock<std::mutex> lock(r.stateMutex());
+        const auto until = std::chrono::steady_clock::now() + std::chrono::milliseconds(state().removeDelayMs);
+        removed().wait_until(lock, until, [] { return state().removeDelayMs == 0; });
     }
-    if (delayMs > 0) std::this_thread::sleep_for(std::chrono::milliseconds(delayMs));
     android::sp<android::Surface> released;
     {
         std::lock_guard<std::mutex> lock(r.stateMutex());

@@ -37,8 +37,8 @@ bool scanInteger(const char*& json, long long low, long long high, long long* va
 }
 
 // The library's own scanner reads JSON by a printf-like template: literal
-// text must match exactly, %s reads up to the next '"' (never more than the
-// caller's ZMF_JSON_TEXT_SIZE-byte buffer holds), %d an int and %ld a long.
+// text must match exactly, %s copies up to the next '"' however long that
+// is (the library does not know the caller's buffer), %d an int and %ld a long.
 // Scanning stops at the first mismatch; the count of values filled so far is
 // the result.
 int scan(const char* json, const char* format, va_list ap) {
@@ -55,7 +55,7 @@ int scan(const char* json, const char* format, va_list ap) {
         if (f[1] == 's') {
             char* out = va_arg(ap, char*);
             size_t n = 0;
-            while (*j != '\0' && *j != '"' && n < ZMF_JSON_TEXT_SIZE - 1) out[n++] = *j++;
+            while (*j != '\0' && *j != '"') out[n++] = *j++;
             out[n] = '\0';
             ++filled;
             f += 2;

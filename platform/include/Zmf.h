@@ -20,8 +20,9 @@ int Zmf_VideoSetListener(ZmfVideoListener pfnListener);
 /* Printable name of an event; never null. */
 const char* Zmf_GetEventName(int iEvent);
 /* Fills the destinations after pcFormat from the JSON text by the template:
- * %s a text (the caller's buffer holds ZMF_JSON_TEXT_SIZE bytes), %d an int,
- * %ld a long. Returns the number of values filled. */
+ * %s a text, copied up to the next quote with no bound on its length (texts
+ * the library hands out fit ZMF_JSON_TEXT_SIZE bytes), %d an int, %ld a long.
+ * Returns the number of values filled. */
 int Zmf_ScanfJson(const char* pcJson, const char* pcFormat, ...);
 
 #define ZMF_JSON_TEXT_SIZE 512

@@ -4,6 +4,7 @@
 // and releases. A callback dead before it is set, and a callback change during
 // a notification, are CallbackTest's part.
 #include <condition_variable>
+#include <functional>
 #include <future>
 #include <mutex>
 
@@ -46,17 +47,31 @@ protected:
 
     // A client whose handler stays inside the transaction until the gate
     // opens: a client busy in its handler, or whose process dies meanwhile.
-    sp<RemoteBinder> gatedClient() {
+    // `then` runs in the handler once the gate is open.
+    sp<RemoteBinder> gatedClient(std::function<void()> then = {}) {
         return new RemoteBinder(
-                [this](uint32_t, const Parcel&, Parcel* reply, uint32_t) {
-                    std::unique_lock<std::mutex> hold(mGateLock);
-                    mMostInside = std::max(mMostInside, ++mInside);
-                    mGateCond.wait(hold, [&] { return mGateOpen; });
-                    --mInside;
+                [this, then](uint32_t, const Parcel&, Parcel* reply, uint32_t) {
+                    {
+                        std::unique_lock<std::mutex> hold(mGateLock);
+                        mMostInside = std::max(mMostInside, ++mInside);
+                        mGateCond.wait(hold, [&] { return mGateOpen; });
+                        --mInside;
+                    }
+                    if (then) then();
                     reply->writeInt32(0);
                     return NO_ERROR;
                 },
                 String16("android.videocallengine.callback"));
+    }
+    void closeGate() {
+        std::lock_guard<std::mutex> hold(mGateLock);
+        mGateOpen = false;
+    }
+    bool handlerInside() {
+        return eventually([&] {
+            std::lock_guard<std::mutex> hold(mGateLock);
+            return mInside == 1;
+        });
     }
     void openGate() {
         std::lock_guard<std::mutex> hold(mGateLock);
@@ -214,6 +229,27 @@ TEST_F(ClientFaultTest, SlowRenderRemovalsNeverTakeAwayRendersSetAgain) {
     EXPECT_EQ(2u, Surface::liveCount());
 }
 
+// The render library never finishes taking a render away: adding that render
+// again waits a bounded time, and no other request waits for it at all.
+TEST_F(ClientFaultTest, AHungRenderRemovalStallsNoOtherRequest) {
+    setSurface(kRemoteView);
+    hostfakes::setRenderRemoveDelayMs(24 * 3600 * 1000);
+    cleanSurface(kRemoteView);
+    auto again = onThread([this] { return send(kSetSurface, {kRemoteView}, enginetest::remoteProducer()); });
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kEngineTag, "setRemoteSurface add Render"));
+    auto others = onThread([this] {
+        EXPECT_EQ(0, setCamera(1));
+        orient(90, 1, 1);
+        return send(kUplinkQos, {500});
+    });
+    const bool answered = finishes(others) && finishes(again);
+    hostfakes::setRenderRemoveDelayMs(0);  // the library's call returns at last
+    ASSERT_TRUE(answered) << "a request waited for the hung removal";
+    EXPECT_EQ(0, others.get());
+    EXPECT_EQ(0, again.get());
+    EXPECT_TRUE(logged("addRender, removal of Remote still pending, adding it anyway", ANDROID_LOG_ERROR));
+}
+
 // A handler that calls back into the engine (the binder driver runs such a
 // call on the notifying thread) while another client thread releases: the
 // release waits for the notification, the handler's call does not wait for
@@ -222,10 +258,7 @@ TEST_F(ClientFaultTest, AHandlerCallingBackIsAnsweredWhileAReleaseWaitsForIt) {
     send(kSetCallback, {}, gatedClient());
     startMedia();
     auto notified = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); });
-    ASSERT_TRUE(eventually([&] {
-        std::lock_guard<std::mutex> hold(mGateLock);
-        return mInside == 1;
-    }));
+    ASSERT_TRUE(handlerInside());
     auto released = onThread([this] { return send(kRelease); });
     // The camera closing is the release's last step before it waits for the notification.
     ASSERT_TRUE(eventually([] { return hostfakes::openCameras().empty(); }));
@@ -237,4 +270,57 @@ TEST_F(ClientFaultTest, AHandlerCallingBackIsAnsweredWhileAReleaseWaitsForIt) {
     openGate();
     ASSERT_TRUE(finishes(notified) && finishes(released));
     EXPECT_EQ(1u, count("release X"));
+}
+
+// The handler answers the event with a request of its own, which the binder
+// driver runs on the notifying thread, while another client thread (or the
+// client's death) changes the callback too.
+TEST_F(ClientFaultTest, AHandlerChangingTheCallbackWhileNotifiedIsAnswered) {
+    constexpr uint32_t kNothing = 100, kDeath = 101;
+    const struct {
+        uint32_t nested, other;
+    } cases[] = {
+            {kSetCallback, kNothing}, {kCleanCallback, kNothing}, {kRelease, kNothing},
+            {kSetCallback, kCleanCallback}, {kCleanCallback, kRelease}, {kRelease, kSetCallback},
+            {kSetCallback, kDeath},
+    };
+    for (const auto& c : cases) {
+        SCOPED_TRACE("nested " + std::to_string(c.nested) + ", other " + std::to_string(c.other));
+        closeGate();
+        const sp<RemoteBinder> next = enginetest::remoteCallback();
+        enginetest::Reply nested{-1, -1, 0};
+        const sp<RemoteBinder> client = gatedClient([&] {
+            nested = enginetest::call(c.nested, {}, c.nested == kSetCallback ? next : nullptr);
+        });
+        send(kSetCallback, {}, client);
+        startMedia();
+        auto notified = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); });
+        ASSERT_TRUE(handlerInside());
+        log.clear();
+        std::future<bool> other;
+        if (c.other == kDeath) {
+            other = onThread([&] { return client->kill(); });
+            ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kServiceTag, kDied));
+        } else if (c.other != kNothing) {
+            other = onThread([&] { return send(c.other, {}, enginetest::remoteCallback()) == 0; });
+            ASSERT_TRUE(eventually([&] { return !log.linesWithTag(kServiceTag).empty(); }));
+        }
+        openGate();
+        ASSERT_TRUE(finishes(notified)) << "the nested request never came back";
+        EXPECT_EQ(0, notified.get());
+        EXPECT_EQ(NO_ERROR, nested.status);
+        EXPECT_EQ(0, nested.value);
+        if (other.valid()) {
+            ASSERT_TRUE(finishes(other));
+            EXPECT_TRUE(other.get());
+            continue;
+        }
+        // Alone, the handler's request has its whole effect.
+        EXPECT_EQ(c.nested == kSetCallback ? 1u : 0u, count("VCE is not released as expected"));
+        EXPECT_EQ(c.nested == kCleanCallback, !hostfakes::openCameras().empty());
+        mmeEvent(23);
+        EXPECT_EQ(c.nested == kSetCallback ? Strings{"code 0 flags 0: 15"} : Strings{}, received(*next));
+        EXPECT_EQ(c.nested == kSetCallback ? 0u : 1u, count("notifyCallback null"));
+        EXPECT_EQ(1u, client->transactionCount());
+    }
 }

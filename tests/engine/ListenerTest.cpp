@@ -126,8 +126,9 @@ TEST_F(ListenerTest, MalformedOrOversizedTextIsRejected) {
             {27, ""},
             {27, R"({"Render":"Remote","SourceType":0,"Win)"},
             {26, R"({"Render":"Remote","SourceType":0,"Width":640,"Height":480})"},
-            // One byte more than the library's id buffer holds with its terminator.
+            // One byte more than the library's texts hold with a terminator, and far more.
             {27, renderJson(std::string(512, 'r'), 0, "640", "480")},
+            {30, captureJson(std::string(8192, 'c'), 480, 640, 30)},
     };
     size_t failures = 0;
     for (const auto& c : cases) {

@@ -123,23 +123,31 @@ TEST_F(LoopbackTest, ReleaseStopsTheStreamAfterRendersAndCamera) {
     EXPECT_TRUE(logged("notifyCallback null"));
 }
 
-TEST_F(LoopbackTest, TheImageGoesToTheLoopbackStreamUntilInitClosesIt) {
+TEST_F(LoopbackTest, TheImageGoesToTheLoopbackStreamUntilInitEndsTheModeAndReleaseClosesIt) {
     startLoopback();
     EXPECT_EQ((Strings{"Mvd_FileStartSendImage(1, " + quoted(kImage) + ") = 0"}),
               callsOf([&] { hide(kImage); }));
     EXPECT_EQ((Strings{"Mvd_FileStopSendImage(1) = 0"}), callsOf([&] { show(); }));
 
-    // init while the stream is open stops and closes it.
-    EXPECT_EQ((Strings{"Mvd_ProcStop(1) = 0", "Mvd_Close(1) = 0"}),
-              mediaEngineCallsOf([&] { send(kEngineInit, {0}); }));
+    // init(0) turns the mode off without touching the stream.
+    EXPECT_TRUE(mediaEngineCallsOf([&] { send(kEngineInit, {0}); }).empty());
+    EXPECT_EQ((Strings{"init, loopback? 0 E", "init, loopback? 0 X"}), engineLinesSince(engineLines().size() - 2));
 
-    // Out of loopback mode nothing reaches a loopback stream any more.
-    EXPECT_TRUE(mediaEngineCallsOf([&] {
-                    setSize(3);
-                    hide(kImage);
-                    EXPECT_EQ(0, setCamera(1));
-                    send(kRelease);
-                }).empty());
+    // Out of loopback mode nothing reaches the stream, until release stops and closes it, once.
+    EXPECT_EQ((Strings{"Mvd_ProcStop(1) = 0", "Mvd_Close(1) = 0"}), mediaEngineCallsOf([&] {
+                  setSize(3);
+                  hide(kImage);
+                  EXPECT_EQ(0, setCamera(1));
+                  send(kRelease);
+                  send(kRelease);
+              }));
+
+    // A loopback init over an open stream closes it before building the next.
+    startLoopback();
+    const Strings again = mediaEngineCallsOf([&] { startLoopback(); });
+    ASSERT_GE(again.size(), 3u);
+    EXPECT_EQ((Strings{"Mvd_ProcStop(2) = 0", "Mvd_Close(2) = 0", "Mvd_Open(\"127.0.0.1\", 5060, out=3) = 0"}),
+              Strings(again.begin(), again.begin() + 3));
 }
 
 TEST_F(LoopbackTest, RefusalsByTheMediaEngine) {

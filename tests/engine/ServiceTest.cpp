@@ -6,7 +6,11 @@
 #include <gmock/gmock.h>
 #include <utils/String16.h>
 
+#include <future>
+
 #include "EngineTestUtil.h"
+#include "MmeJni.h"
+#include "Mvd.h"
 #include "VideoCallEngineService.h"
 
 using namespace android;
@@ -83,8 +87,7 @@ TEST_F(ServiceTest, EachCodeReadsItsFieldsAnswersAndReachesItsOperation) {
             {kHideImage, {2}, {hideLine}, {shownLine}, 0, false, image},
             {kHideImage, {}, {hideLine}, {shownLine}},
             // Hide 1 without the name: nothing to send instead of the camera.
-            {kHideImage, {1}, {hideLine, "E VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused"}, {},
-             BAD_VALUE},
+            {kHideImage, {1}, {hideLine, "E VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused"}, {}},
             // Nothing left to end.
             {kRelease, {}, {"I VCE_ACTION_RELEASE"},
              {"I release", "I setRemoteSurface", "I setRemoteSurface null", "I setRemoteSurface X",
@@ -213,4 +216,66 @@ TEST_F(ServiceTest, TheEngineLivesWhileAnyServiceObjectDoesAndStartsAgainAfter) 
     EXPECT_EQ(answer(0), show(call(kSetCallback, {}, client)));
     mmeEvent(23);
     EXPECT_EQ(1u, client->transactionCount());
+}
+
+// An event already inside the engine when the last service object goes: the
+// engine is deleted only once the event is done with it.
+TEST_F(ServiceTest, TheEngineOutlivesTheEventsInsideItWhenItIsDeleted) {
+    ASSERT_EQ(0, Mvd_EvntSetCallback(Mvd_EvntProc, 1));
+    const struct {
+        const char* entered;  // the engine's first line for the event
+        int (*deliver)();
+    } paths[] = {
+            {"mmeEvtUpdate evt: 22", [] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); }},
+            {"zmfRenderEvtUpdate, evt:28 [Remote], type 0, [640x480]",
+             [] {
+                 return hostfakes::fireZmfEvent(
+                                27, R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})")
+                                ? 0
+                                : -1;
+             }},
+    };
+    for (const auto& path : paths) {
+        SCOPED_TRACE(path.entered);
+        mark();
+        log.holdAt(ANDROID_LOG_INFO, kEngineTag, path.entered);
+        auto event = std::async(std::launch::async, path.deliver);
+        ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kEngineTag, path.entered));
+        // The last service object goes while the event is held inside the engine.
+        auto deleted = std::async(std::launch::async, [this] {
+            defaultServiceManager()->addService(kServiceName, new BBinder());
+            service.clear();
+        });
+        ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kEngineTag, "Destruct"));
+        deleted.wait_for(std::chrono::milliseconds(300));  // room for a deletion that does not wait
+        log.letGo();
+        EXPECT_EQ(0, event.get());
+        deleted.get();
+        Strings order;
+        for (const LogLine& line : log.lines()) order.push_back(line.text);
+        EXPECT_TRUE(inOrder(order, {"Destruct", "notifyCallback null", "zmfTerminate"}));
+
+        ASSERT_EQ(NO_ERROR, VideoCallEngineService::instantiate());
+        service = defaultServiceManager()->checkService(kServiceName);
+    }
+}
+
+// Service objects made and dropped on several threads at once, with no other
+// holding the engine: each sees a live engine, and every engine made is deleted.
+TEST_F(ServiceTest, ServiceObjectsComingAndGoingAtOnceShareOnlyLiveEngines) {
+    ASSERT_EQ(NO_ERROR, defaultServiceManager()->addService(kServiceName, new BBinder()));
+    service.clear();
+    constexpr int kRounds = 2000;
+    auto churn = [] {
+        for (int i = 0; i < kRounds; ++i) {
+            sp<VideoCallEngineService> transient = new VideoCallEngineService();
+            ASSERT_EQ(-1, transient->mVideoCallEngineImpl->mOpenCameraId);
+        }
+    };
+    std::vector<std::thread> others;
+    for (int t = 0; t < 3; ++t) others.emplace_back(churn);
+    churn();
+    for (std::thread& t : others) t.join();
+    EXPECT_EQ(count(kEngineTag, "Construct"), count(kEngineTag, "Destruct"));
+    EXPECT_EQ(nullptr, m_pMmeEventObserver.load());
 }

@@ -113,8 +113,11 @@ TEST_F(MmeSystemTest, AppContextIsHandedToTheRuntime) {
 }
 
 TEST_F(MmeSystemTest, VersionJoinsBothTextsAndStaysWithinItsBuffer) {
+    nextRow(log);
     EXPECT_EQ(u"melon-1.0|mme-1.0", version());
     EXPECT_EQ(V{"mmeGetVer, melon-1.0|mme-1.0"}, bridgeLines(log));
+    EXPECT_EQ((V{"Melon_GetVersion(-> \"melon-1.0\") = 0", "Mme_GetVer(-> \"mme-1.0\") = 0"}),
+              hostfakes::callTexts());
     const std::optional<std::string> none;
     const struct {
         std::optional<std::string> melon, mme;

@@ -202,3 +202,30 @@ TEST(RemoteBinder, TransactionsFromManyThreadsAreAllRecorded) {
     EXPECT_EQ(0, mismatches.load());
     EXPECT_EQ(200u, remote->transactionCount());
 }
+
+// The driver runs a call that the other process makes while being called
+// (back into this process) on the thread waiting for its reply; a handler
+// that calls back here therefore reaches that thread's locks.
+TEST(RemoteBinder, ACallBackFromTheHandlerRunsOnTheThreadWaitingForTheReply) {
+    struct Local : BBinder {
+        status_t onTransact(uint32_t, const Parcel&, Parcel* reply, uint32_t) override {
+            ranOn = std::this_thread::get_id();
+            return reply->writeInt32(5);
+        }
+        std::thread::id ranOn;
+    };
+    sp<Local> local = new Local();
+    sp<RemoteBinder> remote = new RemoteBinder([&](uint32_t, const Parcel&, Parcel* reply, uint32_t) {
+        Parcel request, answer;
+        EXPECT_EQ(NO_ERROR, local->transact(IBinder::FIRST_CALL_TRANSACTION, request, &answer));
+        return reply->writeInt32(answer.readInt32());
+    });
+    std::thread::id caller;
+    Parcel data, reply;
+    std::thread([&] {
+        caller = std::this_thread::get_id();
+        EXPECT_EQ(NO_ERROR, remote->transact(0, data, &reply));
+    }).join();
+    EXPECT_EQ(caller, local->ranOn);
+    EXPECT_EQ(5, reply.readInt32());
+}

@@ -10,12 +10,20 @@ namespace {
 std::mutex gMutex;
 std::condition_variable gCond;
 std::vector<LogLine> gLines;
+bool gHoldArmed = false;
+bool gHolding = false;
+LogLine gHoldLine;
 
 void captureLogger(const struct __android_logger_data* data, const char* message) {
-    std::lock_guard<std::mutex> lock(gMutex);
+    std::unique_lock<std::mutex> lock(gMutex);
     gLines.push_back(LogLine{data->priority, data->tag != nullptr ? data->tag : "", message,
                              std::chrono::steady_clock::now()});
     gCond.notify_all();
+    if (gHoldArmed && gLines.back() == gHoldLine) {
+        gHoldArmed = false;
+        gHolding = true;
+        gCond.wait(lock, [] { return !gHolding; });
+    }
 }
 
 size_t countLocked(int priority, const std::string& tag, const std::string& text) {
@@ -35,6 +43,7 @@ LogCapture::LogCapture() {
 }
 
 LogCapture::~LogCapture() {
+    letGo();
     __android_log_set_logger(__android_log_stderr_logger);
     __android_log_set_minimum_priority(ANDROID_LOG_INFO);
 }
@@ -77,4 +86,17 @@ bool LogCapture::waitFor(int priority, const std::string& tag, const std::string
 void LogCapture::clear() {
     std::lock_guard<std::mutex> lock(gMutex);
     gLines.clear();
+}
+
+void LogCapture::holdAt(int priority, const std::string& tag, const std::string& text) {
+    std::lock_guard<std::mutex> lock(gMutex);
+    gHoldLine = LogLine{priority, tag, text, {}};
+    gHoldArmed = true;
+}
+
+void LogCapture::letGo() {
+    std::lock_guard<std::mutex> lock(gMutex);
+    gHoldArmed = false;
+    gHolding = false;
+    gCond.notify_all();
 }

@@ -39,6 +39,10 @@ public:
     bool waitFor(int priority, const std::string& tag, const std::string& text, size_t times = 1,
                  std::chrono::milliseconds timeout = std::chrono::seconds(10)) const;
     void clear();
+    // The next thread that logs exactly this line stops inside that log call
+    // until letGo() (or the capture's end): a thread held at a known point.
+    void holdAt(int priority, const std::string& tag, const std::string& text);
+    void letGo();
 };
 
 #endif  // QUELLBORN_TESTS_LOGCAPTURE_H

@@ -28,8 +28,7 @@ int gInstanceUsers = 0;
 
 VideoCallEngineImpl* VideoCallEngineImpl::sInstance = nullptr;
 
-VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
-    std::lock_guard<std::mutex> lock(gInstanceLock);
+VideoCallEngineImpl* VideoCallEngineImpl::instanceLocked() {
     if (sInstance == nullptr) {
         LOGI("Create new Instance");
         sInstance = new VideoCallEngineImpl();
@@ -37,9 +36,16 @@ VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
     return sInstance;
 }
 
-VideoCallEngineImpl* VideoCallEngineImpl::acquireInstance() {
-    VideoCallEngineImpl* engine = getInstance();
+VideoCallEngineImpl* VideoCallEngineImpl::getInstance() {
     std::lock_guard<std::mutex> lock(gInstanceLock);
+    return instanceLocked();
+}
+
+VideoCallEngineImpl* VideoCallEngineImpl::acquireInstance() {
+    // Looked up and counted in one step: a release in between would delete
+    // the engine about to be handed out.
+    std::lock_guard<std::mutex> lock(gInstanceLock);
+    VideoCallEngineImpl* engine = instanceLocked();
     ++gInstanceUsers;
     return engine;
 }
@@ -71,7 +77,14 @@ VideoCallEngineImpl::VideoCallEngineImpl()
           mLoopback(false),
           mLoopbackStream(0),
           mVtspManager(nullptr) {
-    pthread_mutex_init(&mLock, nullptr);
+    // Recursive: a client's handler that calls back during a notification
+    // (run by the binder driver on the notifying thread) changes the callback
+    // on the thread that holds mLock.
+    pthread_mutexattr_t recursive;
+    pthread_mutexattr_init(&recursive);
+    pthread_mutexattr_settype(&recursive, PTHREAD_MUTEX_RECURSIVE);
+    pthread_mutex_init(&mLock, &recursive);
+    pthread_mutexattr_destroy(&recursive);
     mVtspManager = VtspManager::getInstance();
     LOGI("Construct");
     mVtspManager->init();
@@ -79,15 +92,13 @@ VideoCallEngineImpl::VideoCallEngineImpl()
 
 VideoCallEngineImpl::~VideoCallEngineImpl() {
     LOGI("Destruct");
+    // The event paths keep raw pointers to their observer: a deleted engine
+    // must not be called back, nor be freed under an event already inside it.
+    unregisterZmfEventObserver(this);
+    unregisterMmeEventObserver(this);
     camdrvTerm();
     renderTerm();
     zmfTerminate();
-    // The event paths keep raw pointers to their observer: a deleted engine
-    // must not be called back.
-    ZmfEventObserver* self = this;
-    m_pZmfEventObserver.compare_exchange_strong(self, nullptr);
-    MmeEventObserver* mmeSelf = this;
-    m_pMmeEventObserver.compare_exchange_strong(mmeSelf, nullptr);
     {
         ScopedPthreadLock lock(mLock);
         mNotifyCallback.clear();
@@ -114,9 +125,9 @@ int VideoCallEngineImpl::initMme() {
 void VideoCallEngineImpl::init(int loopback) {
     std::lock_guard<std::recursive_mutex> op(mOpLock);
     LOGI("init, loopback? %d E", loopback);
-    // A loopback stream the previous call left open would otherwise run on
-    // with nothing left to close it.
-    if (mLoopbackStream != 0) stopLoopBack();
+    // A loopback init over an open loopback stream would leave the old one
+    // running with nothing left to close it; a normal init leaves it to release.
+    if (loopback != 0 && mLoopbackStream != 0) stopLoopBack();
     mLoopback = loopback != 0;
     mCameraId = -1;
     mUplinkQos = 0;
@@ -132,44 +143,40 @@ void VideoCallEngineImpl::init(int loopback) {
 }
 
 void VideoCallEngineImpl::setNotifyCallback(const sp<IVideoCallEngineCallback>& callback) {
-    std::lock_guard<std::mutex> change(mCallbackChangeLock);
     LOGI("%s, callback %p", "setNotifyCallback", callback.get());
-    // Only callback changes write the callback, and they hold
-    // mCallbackChangeLock, so it can be tested here without mLock.
+    // Held throughout, so a change waits for the notification in progress and
+    // the missing release and the new callback are one step for other threads.
+    ScopedPthreadLock lock(mLock);
     if (callback != nullptr && mNotifyCallback != nullptr) {
         LOGI("VCE is not released as expected");
-        releaseCall();
+        release();
     }
-    ScopedPthreadLock lock(mLock);
     mNotifyCallback = callback;
 }
 
 void VideoCallEngineImpl::release() {
-    std::lock_guard<std::mutex> change(mCallbackChangeLock);
-    releaseCall();
-}
-
-void VideoCallEngineImpl::releaseCall() {
-    {
-        std::lock_guard<std::recursive_mutex> op(mOpLock);
-        LOGI("release");
-        mAutoRotate = 1;
-        mDeviceOrientation = 0;
-        mScreenOrientation = 0;
-        mRemoteRotation = 0;
-        setRemoteSurface(nullptr);
-        setPreviewSurface(nullptr);
-        setCameraId(-1);
-        if (mLoopback) stopLoopBack();
-    }
-    // Waiting for a notification in progress without mOpLock: the client's
-    // handler may call back into the engine before it returns (the binder
-    // driver runs such a call on the notifying thread), and that call needs mOpLock.
+    releaseMedia();
+    // Only dropping the callback waits for a notification in progress: the
+    // call's media ends at once even when the client's handler is stuck.
     {
         ScopedPthreadLock lock(mLock);
         mNotifyCallback.clear();
     }
     LOGI("release X");
+}
+
+void VideoCallEngineImpl::releaseMedia() {
+    std::lock_guard<std::recursive_mutex> op(mOpLock);
+    LOGI("release");
+    mAutoRotate = 1;
+    mDeviceOrientation = 0;
+    mScreenOrientation = 0;
+    mRemoteRotation = 0;
+    setRemoteSurface(nullptr);
+    setPreviewSurface(nullptr);
+    setCameraId(-1);
+    // Also a stream left open by a normal init after a loopback one.
+    if (mLoopback || mLoopbackStream != 0) stopLoopBack();
 }
 
 int VideoCallEngineImpl::notifyLocked(int event, const int* args) {
@@ -178,12 +185,15 @@ int VideoCallEngineImpl::notifyLocked(int event, const int* args) {
         LOGI("notifyCallback null");
         return -1;
     }
-    // The client's handler runs while mLock is held, so a callback change
-    // waits for the notification and never races it.
+    // The client's handler runs while mLock is held, so a change from another
+    // thread waits for the notification. A change the handler makes itself
+    // may drop mNotifyCallback meanwhile; this reference keeps the object
+    // being called alive until the call returns.
+    const sp<IVideoCallEngineCallback> callback = mNotifyCallback;
     if (args == nullptr) {
-        mNotifyCallback->notifyCallback(event);
+        callback->notifyCallback(event);
     } else {
-        mNotifyCallback->notifyCallback(event, args[0], args[1], args[2]);
+        callback->notifyCallback(event, args[0], args[1], args[2]);
     }
     return 0;
 }

@@ -9,11 +9,12 @@
 //
 // Locking: the client's operations arrive on several binder threads; one
 // engine-wide lock (mOpLock, recursive because operations build on each
-// other) serialises them. mLock guards only the client callback and is held
-// for each notification, the client's handler included; it is never taken
-// while mOpLock is held, because that handler may call back into the engine.
-// Callback changes (set, clean, release) are serialised by
-// mCallbackChangeLock, taken before either of the others.
+// other) serialises them. mLock guards the client callback and is held for
+// each notification, the client's handler included, and for each callback
+// change. The handler may call back into the engine, and the binder driver
+// runs that call on the notifying thread, so mLock is recursive and is always
+// taken before mOpLock, never while it is held; the service takes it before
+// its own callback lock.
 #ifndef QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
 #define QUELLBORN_VOLTE_VIDEOCALLENGINEIMPL_H
 
@@ -154,18 +155,19 @@ public:
     std::string mHiddenImage;
 
 private:
+    // getInstance() for a caller that holds the instance lock.
+    static VideoCallEngineImpl* instanceLocked();
     int cameraAngle() const;
     int displayAngle() const;
     int notifyLocked(int event, const int* args);
-    // release() for a caller that holds mCallbackChangeLock.
-    void releaseCall();
+    // release()'s media part: renders, camera and loopback stream.
+    void releaseMedia();
     // Starts a detached thread that removes a render (the engine does not wait).
     void startRenderRemoval(const char* renderId);
     bool addRenderFor(const char* caller, const sp<IGraphicBufferProducer>& producer,
                       const char* renderId);
 
     std::recursive_mutex mOpLock;
-    std::mutex mCallbackChangeLock;
 
     static VideoCallEngineImpl* sInstance;
 };

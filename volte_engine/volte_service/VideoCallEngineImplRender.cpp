@@ -3,6 +3,7 @@
 #include <android/log.h>
 #include <gui/Surface.h>
 
+#include <chrono>
 #include <condition_variable>
 #include <map>
 #include <mutex>
@@ -24,8 +25,12 @@ constexpr const char* kTag = "VideoCallEngineImpl";
 // Removals run on detached threads so that the client's binder call never
 // waits for the render library. A render added again under the same id must
 // not be taken away by a removal still pending from before, so an add waits
-// for the removals of its id that were started earlier. The tracker lives for
-// the process: removal threads may outlive the engine.
+// for the removals of its id that were started earlier, but only so long:
+// the add holds the engine's operation lock, and a render library that hangs
+// in one removal must not stall every client. The tracker lives for the
+// process: removal threads may outlive the engine.
+constexpr std::chrono::milliseconds kPendingRemovalWait(1000);
+
 class PendingRemovals {
 public:
     void started(const std::string& id) {
@@ -39,9 +44,10 @@ public:
         }
         mDone.notify_all();
     }
-    void waitFor(const std::string& id) {
+    // False if a removal of `id` is still running after `timeout`.
+    bool waitFor(const std::string& id, std::chrono::milliseconds timeout) {
         std::unique_lock<std::mutex> lock(mMutex);
-        mDone.wait(lock, [&] { return mPending.find(id) == mPending.end(); });
+        return mDone.wait_for(lock, timeout, [&] { return mPending.find(id) == mPending.end(); });
     }
 
 private:
@@ -87,7 +93,9 @@ int VideoCallEngineImpl::removeRender(const char* renderId) {
 
 int VideoCallEngineImpl::addRender(const sp<IGraphicBufferProducer>& producer,
                                    const char* renderId) {
-    pendingRemovals().waitFor(renderId);
+    if (!pendingRemovals().waitFor(renderId, kPendingRemovalWait)) {
+        LOGE("addRender, removal of %s still pending, adding it anyway", renderId);
+    }
     // The render library takes the surface over; the engine keeps no reference.
     return renderAdd(new Surface(producer, false), renderId);
 }

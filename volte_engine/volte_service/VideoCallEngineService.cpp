@@ -11,6 +11,7 @@
 #include <cstdio>
 #include <string>
 
+#include "ScopedPthreadLock.h"
 #include "VideoCallEngineDump.h"
 #include "VideoCallEngineImpl.h"
 
@@ -162,8 +163,8 @@ status_t VideoCallEngineService::onTransact(uint32_t code, const Parcel& data, P
             break;
         }
         case VCE_ACTION_HIDE_LOCAL_IMAGE:
-            hideLocalImage(data, reply);
-            return NO_ERROR;
+            hideLocalImage(data);
+            break;
         case VCE_ACTION_SET_UPLINK_QOS:
             LOGI("VCE_ACTION_SET_UPLINK_QOS");
             engine->setUplinkQos(data.readInt32());
@@ -198,6 +199,7 @@ void VideoCallEngineService::setSurface(const Parcel& data, Parcel* reply) {
 
 void VideoCallEngineService::setCallback(const Parcel& data) {
     LOGI("VCE_ACTION_SET_CALLBACK");
+    ScopedPthreadLock notifications(mVideoCallEngineImpl->mLock);
     std::lock_guard<std::mutex> lock(mCallbackLock);
     // The previous client's death link stays: its death still releases the engine.
     mCallback = IVideoCallEngineCallback::asInterface(data.readStrongBinder());
@@ -209,6 +211,7 @@ void VideoCallEngineService::setCallback(const Parcel& data) {
 
 void VideoCallEngineService::cleanCallback() {
     LOGI("VCE_ACTION_CLEAN_CALLBACK");
+    ScopedPthreadLock notifications(mVideoCallEngineImpl->mLock);
     std::lock_guard<std::mutex> lock(mCallbackLock);
     if (mCallback != nullptr) {
         IInterface::asBinder(mCallback)->unlinkToDeath(this, nullptr, 0, nullptr);
@@ -228,18 +231,18 @@ void VideoCallEngineService::cleanSurface(const Parcel& data) {
     }
 }
 
-void VideoCallEngineService::hideLocalImage(const Parcel& data, Parcel* reply) {
+void VideoCallEngineService::hideLocalImage(const Parcel& data) {
     LOGI("VCE_ACTION_HIDE_LOCAL_IMAGE");
     const bool hide = data.readInt32() == kHide;
     const char* path = hide ? data.readCString() : nullptr;
     if (hide && path == nullptr) {
-        // A truncated request: there is no image to send in the camera's place.
+        // A truncated request: there is no image to send in the camera's
+        // place, and the media engine must never get a null path. It is
+        // answered as every request handled here is.
         LOGE("VCE_ACTION_HIDE_LOCAL_IMAGE, image path missing, refused");
-        reply->writeInt32(BAD_VALUE);
         return;
     }
     mVideoCallEngineImpl->hideLocalImage(hide, path);
-    reply->writeInt32(0);
 }
 
 }  // namespace android

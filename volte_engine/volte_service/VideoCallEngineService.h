@@ -63,10 +63,12 @@ private:
     void setCallback(const Parcel& data);
     void cleanCallback();
     void cleanSurface(const Parcel& data);
-    void hideLocalImage(const Parcel& data, Parcel* reply);
+    void hideLocalImage(const Parcel& data);
 
     // Codes 2 and 3 replace mCallback and its death link from any binder
     // thread; this keeps each replacement and its engine call in one piece.
+    // Taken after the engine's callback lock (mLock), which a notification
+    // holds while the client's handler may send code 2 or 3 on that thread.
     std::mutex mCallbackLock;
 };
 

@@ -2,6 +2,10 @@
 
 #include <android/log.h>
 
+#include <cstring>
+#include <vector>
+
+#include "ObserverCalls.h"
 #include "Zmf.h"
 
 __attribute__((visibility("default"))) unsigned char _zmf = 0;
@@ -42,10 +46,15 @@ constexpr const char* kTemplateRenderWindowSize =
 constexpr const char* kTemplateRenderWindow =
         "{\"Render\":\"%s\",\"SourceType\":%d,\"Window\":%ld}";
 
-// Values scanned out of one event. The id buffer is the size the library
-// bounds %s to; the library never writes past it.
+// Values scanned out of one event. The library copies %s as far as the text
+// goes, whatever the caller's buffer holds, so the id's buffer is as long as
+// the whole text: no id scanned out of it can be longer.
 struct EventValues {
-    char id[ZMF_JSON_TEXT_SIZE] = {};
+    explicit EventValues(const char* json) : idBuffer(strlen(json) + 1, '\0'), id(idBuffer.data()) {}
+    EventValues(const EventValues&) = delete;
+    EventValues& operator=(const EventValues&) = delete;
+    std::vector<char> idBuffer;
+    char* id;
     int sourceType = 0;
     int face = 0;
     int width = 0;
@@ -54,8 +63,9 @@ struct EventValues {
     long window = 0;  // the platform's long: 32 bits on the device, 64 on the host
 };
 
-bool scanned(int got, int expected) {
-    if (got == expected) return true;
+// An id longer than the library's own texts is not one it handed out.
+bool scanned(int got, int expected, const EventValues& v) {
+    if (got == expected && strnlen(v.id, ZMF_JSON_TEXT_SIZE) < ZMF_JSON_TEXT_SIZE) return true;
     LOGE("scanf json failed");
     return false;
 }
@@ -65,23 +75,23 @@ bool scanEvent(int event, const char* json, EventValues& v) {
         case kCaptureStarted:
         case kCaptureSize:
             return scanned(Zmf_ScanfJson(json, kTemplateCapture, v.id, &v.width, &v.height,
-                                         &v.frameRate), 4);
+                                         &v.frameRate), 4, v);
         case kCaptureStopped:
-            return scanned(Zmf_ScanfJson(json, kTemplateCaptureId, v.id), 1);
+            return scanned(Zmf_ScanfJson(json, kTemplateCaptureId, v.id), 1, v);
         case kCaptureFace:
             return scanned(Zmf_ScanfJson(json, kTemplateCaptureFace, v.id, &v.face, &v.width,
-                                         &v.height), 4);
+                                         &v.height), 4, v);
         case kRenderAdded:
             return scanned(Zmf_ScanfJson(json, kTemplateRender, v.id, &v.sourceType, &v.width,
-                                         &v.height), 4);
+                                         &v.height), 4, v);
         case kRenderStarted:
         case kRenderSizeA:
         case kRenderSize:
             return scanned(Zmf_ScanfJson(json, kTemplateRenderWindowSize, v.id, &v.sourceType,
-                                         &v.window, &v.width, &v.height), 5);
+                                         &v.window, &v.width, &v.height), 5, v);
         case kRenderRemoved:
             return scanned(Zmf_ScanfJson(json, kTemplateRenderWindow, v.id, &v.sourceType,
-                                         &v.window), 3);
+                                         &v.window), 3, v);
         default:
             return false;
     }
@@ -90,6 +100,16 @@ bool scanEvent(int event, const char* json, EventValues& v) {
 }  // namespace
 
 std::atomic<ZmfEventObserver*> m_pZmfEventObserver{nullptr};
+
+namespace {
+
+ObserverCalls& observerCalls() {
+    // The listener thread may still call while the process exits.
+    static auto* calls = new ObserverCalls();
+    return *calls;
+}
+
+}  // namespace
 
 void zmfInitialize() {
     LOGI("%s", "zmfInitialize");
@@ -115,6 +135,10 @@ int registerZmfEventObserver(ZmfEventObserver* observer) {
     return 0;
 }
 
+void unregisterZmfEventObserver(ZmfEventObserver* observer) {
+    observerCalls().unregister(m_pZmfEventObserver, observer);
+}
+
 void listen(int event, const char* json, int /*arg*/) {
     LOGI("%s, Evt:%s=%s", "listen", Zmf_GetEventName(event), json != nullptr ? json : "(null)");
     if (event < kFirstEvent || event > kLastEvent) return;
@@ -123,9 +147,10 @@ void listen(int event, const char* json, int /*arg*/) {
         LOGE("scanf json failed");
         return;
     }
-    EventValues v;
+    EventValues v(json);
     if (!scanEvent(event, json, v)) return;
 
+    ObserverCalls::Call call(observerCalls());
     ZmfEventObserver* observer = m_pZmfEventObserver.load();
     if (observer == nullptr) return;
     switch (event) {

@@ -24,6 +24,9 @@ void zmfInitialize();
 int zmfTerminate();
 // Stores the observer that forwarded events reach (null unregisters); returns 0.
 int registerZmfEventObserver(ZmfEventObserver* observer);
+// Takes `observer` away if it is the one registered and waits for the event
+// calls that reached it already: it may be deleted once this returns.
+void unregisterZmfEventObserver(ZmfEventObserver* observer);
 // The listener registered with the video library.
 void listen(int event, const char* json, int arg);
 

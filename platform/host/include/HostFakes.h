@@ -71,7 +71,8 @@ void setNextCameraHandle(int handle);
 std::vector<int> openCameras();
 
 // Render library: renderRemove sleeps this long before it removes the render,
-// so a test can show that nobody waits for it.
+// so a test can show that nobody waits for it; setting it back to 0 ends the
+// sleeps in progress, so a very long delay plays a hung library call.
 void setRenderRemoveDelayMs(int ms);
 // Ids of the renders that are added, ascending.
 std::vector<std::string> activeRenders();
