@@ -8,6 +8,8 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
+#include <vector>
 
 #include "CameraCodecParameter.h"
 #include "CmdCallback.h"
@@ -31,9 +33,11 @@ public:
     void setCodecParam(CameraCodecParameter::CameraConfigEnum config) override;
     void sendReplacedImage(bool start, const char* path) override;
 
-    // Diagnostics for tools and tests.
+    // Diagnostics for tools and tests: copies taken under the lock, since the
+    // handling thread may change a stream at any moment.
     size_t streamCount();
-    std::shared_ptr<StreamInfoMvd> stream(uint32_t streamId);
+    std::optional<StreamSnapshot> snapshot(uint32_t streamId);
+    std::vector<StreamSnapshot> snapshots();  // in ascending stream id order
     CameraCodecParameter::CameraConfigEnum cameraConfig();
     const char* captureId();
 

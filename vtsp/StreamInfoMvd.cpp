@@ -11,7 +11,6 @@ namespace {
 constexpr const char* kTag = "CmdclbMVD";
 constexpr const char* kH264Name = "H264";
 constexpr const char* kVideoOrientationUri = "urn:3gpp:video-orientation";
-constexpr int32_t kInitialRtcpMask = 0xD0;
 constexpr uint32_t kNoStream = 0xFFFFFFFFu;
 constexpr uint32_t kKbps = 1024;
 
@@ -170,6 +169,8 @@ bool StreamInfoMvd::codecParamConfig(const CmdBuffer& cmd, int prevStat) {
             cap >= 1 && cap <= static_cast<uint32_t>(p.maxBitrate) ? static_cast<int32_t>(cap)
                                                                    : p.maxBitrate;
     Mvd_ArsSetParm(mMvdStreamId, p.minBitrate, upper, (2 * p.frameRate) / 3, p.frameRate);
+    mMinBitrate = p.minBitrate;
+    mMaxBitrate = upper;
 
     if (Mvd_SetCdc(mMvdStreamId, &codec) != 0) {
         LOGE("%s: SetCodec failed !!!", "codecParamConfig");
@@ -177,6 +178,7 @@ bool StreamInfoMvd::codecParamConfig(const CmdBuffer& cmd, int prevStat) {
     }
     Mvd_SetSendPayload(mMvdStreamId, static_cast<unsigned char>(mPayloadType));
     const int* w = codec.aiWord;
+    mBitrate = w[MVD_CODEC_WORD_BITRATE];
     LOGD("%s: codec set payload %d, bitrate %d, fps %d, %d x %d, mCameraConfig %d",
          "codecParamConfig", w[MVD_CODEC_WORD_PAYLOAD], w[MVD_CODEC_WORD_BITRATE],
          w[MVD_CODEC_WORD_FRAMERATE], w[MVD_CODEC_WORD_WIDTH], w[MVD_CODEC_WORD_HEIGHT],
@@ -203,6 +205,7 @@ bool StreamInfoMvd::rtcpParamConfig(const CmdBuffer& cmd, int prevStat) {
     if (strcmp(uri, kVideoOrientationUri) == 0) {
         Mvd_RtpSetExt(mMvdStreamId, MVD_RTP_EXT_VIDEO_ORIENTATION,
                       static_cast<unsigned char>(v.extmapId));
+        mOrientationExtId = static_cast<unsigned char>(v.extmapId);
     }
 
     const int red = Mvd_RedSetEnable(mMvdStreamId, 0);
@@ -240,6 +243,8 @@ void StreamInfoMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config)
     }
     if (Mvd_SetCdc(mMvdStreamId, &codec) != 0) {
         LOGE("%s: SetCodec failed !!!", "setCodecParam");
+    } else {
+        mBitrate = codec.aiWord[MVD_CODEC_WORD_BITRATE];
     }
     // Resumed even when the engine refused the codec: the streams then go on
     // with the codec they had, where waiting for the next modify of this
@@ -251,6 +256,27 @@ void StreamInfoMvd::resumeIfParamChanged() {
     if (!mParamChanged) return;
     Mvd_ResumeAllStrm();
     mParamChanged = false;
+}
+
+StreamSnapshot StreamInfoMvd::snapshot() const {
+    StreamSnapshot s;
+    s.streamId = mStreamId;
+    s.mvdStreamId = mMvdStreamId;
+    s.stat = mStat;
+    s.localIp = mLocalIp;
+    s.localPort = mLocalPort;
+    s.remoteIp = mRemoteIp;
+    s.remotePort = mRemotePort;
+    s.payloadType = mPayloadType;
+    s.bitrate = mBitrate;
+    s.minBitrate = mMinBitrate;
+    s.maxBitrate = mMaxBitrate;
+    s.rtcpMask = mRTCPEnableMask;
+    s.orientationExtId = mOrientationExtId;
+    s.procStartCnt = mProcStartCnt;
+    s.captureId = text(mCaptureId);
+    s.renderId = text(mRenderId);
+    return s;
 }
 
 void StreamInfoMvd::setCaptureId(const char* id) {

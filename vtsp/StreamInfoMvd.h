@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <string>
 
 #include "CameraCodecParameter.h"
 #include "CmdBuffer.h"
@@ -12,6 +13,27 @@
 #include "Mvd.h"
 
 namespace android {
+
+// A copy of one stream's state for diagnostics, taken while nothing else may
+// change the stream.
+struct StreamSnapshot {
+    uint32_t streamId = 0;
+    uint32_t mvdStreamId = 0;
+    int32_t stat = 0;
+    std::string localIp;
+    uint16_t localPort = 0;
+    std::string remoteIp;
+    uint16_t remotePort = 0;
+    int32_t payloadType = 0;
+    int32_t bitrate = 0;     // of the codec last applied, bit/s; 0 before any
+    int32_t minBitrate = 0;  // rate-control range last applied, bit/s
+    int32_t maxBitrate = 0;
+    int32_t rtcpMask = 0;
+    int32_t orientationExtId = -1;  // -1: the video orientation extension is not set
+    int32_t procStartCnt = 0;
+    std::string captureId;
+    std::string renderId;
+};
 
 class StreamInfoMvd : public CmdCallback {
 public:
@@ -28,6 +50,8 @@ public:
     static constexpr int32_t RTCP_FB_FIR = 0x40;
     static constexpr int32_t RTCP_FB_TMMBR = 0x80;
     static constexpr int32_t kRtcpFbKeptBits = RTCP_FB_NACK | RTCP_FB_FIR | RTCP_FB_TMMBR;
+    // What a fresh engine stream is taken to do until told otherwise.
+    static constexpr int32_t kInitialRtcpMask = RTCP_FB_NACK | RTCP_FB_FIR | RTCP_FB_TMMBR;
 
     // `captureId` is kept as a pointer: the text must outlive the stream.
     StreamInfoMvd(std::shared_ptr<CameraCodecParameter> table,
@@ -58,9 +82,15 @@ public:
     bool rtcpParamConfig(const CmdBuffer& cmd, int prevStat);
 
     bool isAlive() const { return mStat != STREAM_ENDED; }
+    StreamSnapshot snapshot() const;
 
     // Lifts a suspend of all engine streams that this stream caused.
     void resumeIfParamChanged();
+    // Detaches the camera from the engine stream and stops its processing.
+    void stopEngineStream();
+    // Gives the engine stream back before a start opens another one, and
+    // forgets what the old one was told so the new one is told all of it.
+    void releaseEngineStream();
 
     static bool isActive(int32_t stat) {
         return stat == STREAM_SENDONLY || stat == STREAM_RECVONLY || stat == STREAM_SENDRECV;
@@ -89,6 +119,12 @@ public:
     int32_t mRTCPEnableMask;
     CameraCodecParameter::CameraConfigEnum mCameraConfig;
     std::shared_ptr<CameraCodecParameter> mCameraCodecParameter;
+
+    // What the engine stream was last given, for diagnostics.
+    int32_t mBitrate = 0;
+    int32_t mMinBitrate = 0;
+    int32_t mMaxBitrate = 0;
+    int32_t mOrientationExtId = -1;
 };
 
 // Builds the bind request that tells the modem a stream's local end. The
