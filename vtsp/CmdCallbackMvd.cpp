@@ -103,10 +103,19 @@ size_t CmdCallbackMvd::streamCount() {
     return mStreams.size();
 }
 
-std::shared_ptr<StreamInfoMvd> CmdCallbackMvd::stream(uint32_t streamId) {
+std::optional<StreamSnapshot> CmdCallbackMvd::snapshot(uint32_t streamId) {
     std::lock_guard<std::mutex> lock(mMutex);
     const auto it = mStreams.find(streamId);
-    return it == mStreams.end() ? nullptr : it->second;
+    if (it == mStreams.end()) return std::nullopt;
+    return it->second->snapshot();
+}
+
+std::vector<StreamSnapshot> CmdCallbackMvd::snapshots() {
+    std::lock_guard<std::mutex> lock(mMutex);
+    std::vector<StreamSnapshot> out;
+    out.reserve(mStreams.size());
+    forEachStream([&out](StreamInfoMvd& s) { out.push_back(s.snapshot()); });
+    return out;
 }
 
 CameraCodecParameter::CameraConfigEnum CmdCallbackMvd::cameraConfig() {

@@ -8,6 +8,7 @@
 #include <map>
 #include <memory>
 #include <mutex>
+#include <optional>
 #include <vector>
 
 #include "CameraCodecParameter.h"
@@ -34,9 +35,11 @@ public:
     void setCodecParam(CameraCodecParameter::CameraConfigEnum config) override;
     void sendReplacedImage(bool start, const char* path) override;
 
-    // Diagnostics for tools and tests.
+    // Diagnostics for tools and tests: copies taken under the lock, since the
+    // handling thread may change a stream at any moment.
     size_t streamCount();
-    std::shared_ptr<StreamInfoMvd> stream(uint32_t streamId);
+    std::optional<StreamSnapshot> snapshot(uint32_t streamId);
+    std::vector<StreamSnapshot> snapshots();  // in ascending stream id order
     CameraCodecParameter::CameraConfigEnum cameraConfig();
     const char* captureId();
     // The streams as the last command or setter left them, ascending by

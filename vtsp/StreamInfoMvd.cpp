@@ -11,7 +11,6 @@ namespace {
 constexpr const char* kTag = "CmdclbMVD";
 constexpr const char* kH264Name = "H264";
 constexpr const char* kVideoOrientationUri = "urn:3gpp:video-orientation";
-constexpr int32_t kInitialRtcpMask = 0xD0;
 constexpr uint32_t kNoStream = 0xFFFFFFFFu;
 constexpr uint32_t kKbps = 1024;
 

@@ -5,6 +5,7 @@
 
 #include <cstdint>
 #include <memory>
+#include <string>
 
 #include "CameraCodecParameter.h"
 #include "CmdBuffer.h"
@@ -60,6 +61,8 @@ public:
     static constexpr int32_t RTCP_FB_FIR = 0x40;
     static constexpr int32_t RTCP_FB_TMMBR = 0x80;
     static constexpr int32_t kRtcpFbKeptBits = RTCP_FB_NACK | RTCP_FB_FIR | RTCP_FB_TMMBR;
+    // What a fresh engine stream is taken to do until told otherwise.
+    static constexpr int32_t kInitialRtcpMask = RTCP_FB_NACK | RTCP_FB_FIR | RTCP_FB_TMMBR;
 
     // `captureId` is kept as a pointer: the text must outlive the stream.
     StreamInfoMvd(std::shared_ptr<CameraCodecParameter> table,
@@ -95,6 +98,11 @@ public:
 
     // Lifts a suspend of all engine streams that this stream caused.
     void resumeIfParamChanged();
+    // Detaches the camera from the engine stream and stops its processing.
+    void stopEngineStream();
+    // Gives the engine stream back before a start opens another one, and
+    // forgets what the old one was told so the new one is told all of it.
+    void releaseEngineStream();
 
     static bool isActive(int32_t stat) {
         return stat == STREAM_SENDONLY || stat == STREAM_RECVONLY || stat == STREAM_SENDRECV;

@@ -44,12 +44,19 @@ CmdBuffer* StreamInfoMvd::commandStartHandler(const CmdBuffer& cmd) {
 }
 
 CmdBuffer* StreamInfoMvd::commandModifyHandler(const CmdBuffer& cmd) {
-    const int prevStat = mStat;
+    int prevStat = mStat;
     CmdBuffer* reply = nullptr;
     if (!socketLocalParamConfig(cmd)) return reply;
 
     if (cmd.command().code == _VTSP_CMD_STREAM_VIDEO_START) {
         reply = BindToNet(&cmd.command().u.stmVideo.localAddr, static_cast<int>(mStreamId));
+        if (mMvdStreamId != 0) {
+            // Opening again would orphan the running engine stream with its
+            // camera attached; the new one is not running, so configuring it
+            // needs no suspend of the others.
+            releaseEngineStream();
+            prevStat = mStat;
+        }
         if (Mvd_Open(mLocalIp, mLocalPort, &mMvdStreamId) != 0) {
             LOGE("%s: Failed to Mvd_open, ip:%s, port: %d", "commandModifyHandler", mLocalIp,
                  int(mLocalPort));
@@ -65,7 +72,12 @@ CmdBuffer* StreamInfoMvd::commandModifyHandler(const CmdBuffer& cmd) {
     LOGD("%s: Mvd_SetUniqueName(), streamId %d, renderid %s, ret %d", "commandModifyHandler",
          int(mMvdStreamId), mRenderId, named);
 
-    if (!codecParamConfig(cmd, prevStat)) return reply;
+    if (!codecParamConfig(cmd, prevStat)) {
+        // The engine may have refused the codec after every stream was
+        // suspended for it; they go on with the codec they had.
+        resumeIfParamChanged();
+        return reply;
+    }
     rtcpParamConfig(cmd, prevStat);
 
     // A suspend caused by this command's codec or RTCP step, or by a remote
@@ -133,13 +145,31 @@ void StreamInfoMvd::configStreamDir(const CmdBuffer& cmd) {
 
 CmdBuffer* StreamInfoMvd::commandEndHandler(const CmdBuffer& /*cmd*/) {
     mStat = STREAM_ENDED;
-    if (mMvdStreamId == 0) return nullptr;
+    stopEngineStream();
+    return nullptr;
+}
+
+void StreamInfoMvd::stopEngineStream() {
+    if (mMvdStreamId == 0) return;
     Mvd_CaptureDetach(mMvdStreamId);
     if (mProcStartCnt > 0) {
         Mvd_ProcStop(mMvdStreamId);
         mProcStartCnt = 0;
     }
-    return nullptr;
+}
+
+void StreamInfoMvd::releaseEngineStream() {
+    LOGD("%s: stream %d is open, Mvd_Close(%d) before opening again", "commandModifyHandler",
+         int(mStreamId), int(mMvdStreamId));
+    stopEngineStream();
+    Mvd_Close(mMvdStreamId);
+    mMvdStreamId = 0;
+    mStat = STREAM_ENDED;
+    mRemoteAddrType = 0;
+    mRemotePort = 0;
+    mRTCPEnableMask = kInitialRtcpMask;
+    mRateControl = StreamRateControl{};
+    mOrientationExtId = -1;
 }
 
 }  // namespace android

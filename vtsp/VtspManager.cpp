@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstring>
 
 #include "ModemPipe.h"
@@ -17,12 +18,21 @@ namespace {
 constexpr const char* kTag = "VTSPManager";
 constexpr int kRecordSize = static_cast<int>(kVprCommSize);
 constexpr unsigned int kDeviceRetrySeconds = 2;
+using Clock = std::chrono::steady_clock;
+
 // How often destroy() repeats SIGUSR1 while a device thread has not ended: a
 // signal that lands between the thread's flag test and its read is lost.
 constexpr useconds_t kResignalMicros = 5000;
 // A record half written when the link is told to stop is finished, but a
-// device that never takes the rest must not hold destroy() forever.
-constexpr int kMaxWriteRetriesAfterStop = 200;
+// device that never takes the rest must not hold destroy() forever. Measured
+// in time: destroy()'s own wake-ups interrupt the write every few ms.
+constexpr auto kFinishRecordAfterStop = std::chrono::seconds(2);
+// A device failing while such a record is finished is retried after this
+// pause, not in a busy loop.
+constexpr useconds_t kStoppedRetryMicros = 10000;
+// destroy() stops waking a device thread after this long (longer than
+// kFinishRecordAfterStop, the longest a woken thread may rightly take).
+constexpr auto kWakeUpLimit = std::chrono::seconds(5);
 
 void installSigusr1Handler() {
     struct sigaction action {};
@@ -30,6 +40,19 @@ void installSigusr1Handler() {
     sigemptyset(&action.sa_mask);
     action.sa_flags = 0;  // no SA_RESTART: a blocked read or write must fail with EINTR
     sigaction(SIGUSR1, &action, nullptr);
+}
+
+// A thread inherits the signal mask of the thread that created it; a link
+// started from a thread that blocks SIGUSR1 could otherwise never be woken.
+void acceptSigusr1() {
+    sigset_t set;
+    sigemptyset(&set);
+    sigaddset(&set, SIGUSR1);
+    pthread_sigmask(SIG_UNBLOCK, &set, nullptr);
+}
+
+long long msSince(Clock::time_point start) {
+    return std::chrono::duration_cast<std::chrono::milliseconds>(Clock::now() - start).count();
 }
 
 void nameThread(const char* name) {
@@ -68,6 +91,10 @@ VtspManager::VtspManager(const char* devName)
     mCameraCodecParameter->fill(CameraCodecParameter::CODEC_H264);
     mCameraCodecParameter->fill(CameraCodecParameter::CODEC_OTHER);
     mCmdCallback = std::make_shared<CmdCallbackMvd>(mCameraCodecParameter);
+}
+
+VtspManager::~VtspManager() {
+    destroy();
 }
 
 bool VtspManager::init() {
@@ -118,13 +145,17 @@ void VtspManager::stop() {
     mTxQueue.reset();
 }
 
-void VtspManager::joinThread(pthread_t& thread, std::atomic<bool>* ended) {
+void VtspManager::joinThread(pthread_t& thread, std::atomic<bool>* ended, const char* name) {
     if (thread == 0) return;
-    if (ended != nullptr) {
-        while (!ended->load()) {
-            pthread_kill(thread, SIGUSR1);
-            usleep(kResignalMicros);
+    const auto began = Clock::now();
+    while (ended != nullptr && !ended->load()) {
+        if (Clock::now() - began >= kWakeUpLimit) {
+            __android_log_print(ANDROID_LOG_ERROR, kTag, "%s: %s has not ended after %lld ms, no longer waking it",
+                                "destroy", name, msSince(began));
+            break;
         }
+        pthread_kill(thread, SIGUSR1);
+        usleep(kResignalMicros);
     }
     pthread_join(thread, nullptr);
     // Forgetting the handle lets a later init() start a fresh set of threads
@@ -137,9 +168,9 @@ void VtspManager::destroy() {
     mTxRunning = false;
     mRxQueue.destroy();
     mTxQueue.destroy();
-    joinThread(mRxThread, &mRxEnded);
-    joinThread(mTxThread, &mTxEnded);
-    joinThread(mHandleThread, nullptr);
+    joinThread(mRxThread, &mRxEnded, "tVtspCmdRx");
+    joinThread(mTxThread, &mTxEnded, "tVtspCmdTx");
+    joinThread(mHandleThread, nullptr, "tVtspCmdHd");
     if (mFd != -1) {
         close(mFd);
         mFd = -1;
@@ -188,6 +219,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdRxFunc E", "cmdRxFunc");
     auto record = std::make_unique<VPR_Comm>();
     installSigusr1Handler();
+    acceptSigusr1();
     nameThread("tVtspCmdRx");
 
     int count = 0;
@@ -253,8 +285,11 @@ void* VtspManager::cmdTxFunc(void* arg) {
     auto* vm = static_cast<VtspManager*>(arg);
     __android_log_print(ANDROID_LOG_DEBUG, kTag, "%s: cmdTxFunc: E", "cmdTxFunc");
     installSigusr1Handler();
+    acceptSigusr1();
     nameThread("tVtspCmdTx");
 
+    // The modem still waits for the rest of a record the last link run cut short.
+    if (vm->mTxRunning) vm->finishUnsentRecord();
     while (vm->mTxRunning) {
         std::shared_ptr<CmdBuffer> reply;
         if (!vm->mTxQueue.waitAndPop(reply)) {
@@ -299,30 +334,65 @@ int VtspManager::readFromVpr(VtspManager* vm, unsigned char* buf, int /*len*/) {
 }
 
 int VtspManager::writeToVpr(VtspManager* vm, const unsigned char* buf, int len) {
-    int done = 0;
-    int retriesAfterStop = 0;
+    // Bytes of another record in between would misalign the modem for good.
+    if (!vm->finishUnsentRecord()) return 0;
+    const int done = vm->writeFrom(buf, 0);
+    if (done == kRecordSize) return len;
+    if (done > 0) {
+        memcpy(&vm->mUnsent, buf, sizeof(vm->mUnsent));
+        vm->mUnsentFrom = done;
+        __android_log_print(ANDROID_LOG_ERROR, kTag,
+                            "%s: %s took %d of %d bytes before the link stopped, the rest goes out first "
+                            "when it runs again",
+                            "writeToVpr", vm->mDevName, done, kRecordSize);
+    }
+    return done;
+}
+
+bool VtspManager::finishUnsentRecord() {
+    if (mUnsentFrom == 0) return true;
+    mUnsentFrom = writeFrom(reinterpret_cast<const unsigned char*>(&mUnsent), mUnsentFrom);
+    if (mUnsentFrom < kRecordSize) return false;
+    mUnsentFrom = 0;
+    __android_log_print(ANDROID_LOG_INFO, kTag, "%s: rest of the unfinished record written to %s",
+                        "writeToVpr", mDevName);
+    return true;
+}
+
+int VtspManager::writeFrom(const unsigned char* record, int from) {
+    int done = from;
+    bool stopping = false;
+    Clock::time_point stopSeen;
     while (done < kRecordSize) {
-        const ssize_t n = write(vm->mFd, buf + done, kRecordSize - done);
+        const ssize_t n = write(mFd, record + done, kRecordSize - done);
         if (n > 0) {
             done += static_cast<int>(n);
-            vm->mCounters.bytesWritten += static_cast<uint64_t>(n);
+            mCounters.bytesWritten += static_cast<uint64_t>(n);
             continue;
         }
         const int err = errno;
-        if (vm->mRxRunning) {
-            ++vm->mCounters.retries;
-            if (n < 0 && err == EINTR) continue;
-            ++vm->mCounters.writeFailures;
-            vm->mCounters.lastWriteErrno = n == 0 ? 0 : err;
-            __android_log_print(ANDROID_LOG_ERROR, kTag, "Failed to write data to %s, err: %s",
-                                vm->mDevName, failureText(n, err));
+        const bool interrupted = n < 0 && err == EINTR;
+        if (mRxRunning) {
+            ++mCounters.retries;
+            if (interrupted) continue;
+            ++mCounters.writeFailures;
+            mCounters.lastWriteErrno = n == 0 ? 0 : err;
+            __android_log_print(ANDROID_LOG_ERROR, kTag, "Failed to write data to %s, err: %s", mDevName,
+                                failureText(n, err));
             sleep(kDeviceRetrySeconds);
             continue;
         }
+        // Stopping: a record not begun is dropped whole; one that has begun
+        // is finished if the device takes the rest in time.
         if (done == 0) return 0;
-        if (++retriesAfterStop > kMaxWriteRetriesAfterStop) return done;
+        if (!stopping) {
+            stopping = true;
+            stopSeen = Clock::now();
+        }
+        if (Clock::now() - stopSeen >= kFinishRecordAfterStop) return done;
+        if (!interrupted) usleep(kStoppedRetryMicros);
     }
-    return len;
+    return done;
 }
 
 }  // namespace android

@@ -7,7 +7,10 @@
 //   tVtspCmdTx  writes each reply as a whole record.
 //
 // SIGUSR1 (installed without SA_RESTART) interrupts a thread blocked in the
-// device so that destroy() can end it.
+// device so that destroy() can end it. A reply that has begun to go out is
+// finished even while the link stops; one the device does not take in time
+// is kept, and its rest goes out first when the link runs again, so the
+// modem never sees a record cut short.
 #ifndef QUELLBORN_VTSP_VTSPMANAGER_H
 #define QUELLBORN_VTSP_VTSPMANAGER_H
 
@@ -41,6 +44,8 @@ public:
     // A link of its own on `devName`; tests and tools use this to run a link
     // on a pseudo-terminal without touching the process singleton.
     explicit VtspManager(const char* devName);
+    // Ends the threads before the members they use go away.
+    ~VtspManager();
     VtspManager(const VtspManager&) = delete;
     VtspManager& operator=(const VtspManager&) = delete;
 
@@ -112,7 +117,18 @@ private:
     std::atomic<bool> mRxEnded{false};
     std::atomic<bool> mTxEnded{false};
 
-    void joinThread(pthread_t& thread, std::atomic<bool>* ended);
+    void joinThread(pthread_t& thread, std::atomic<bool>* ended, const char* name);
+    // Writes `record` from byte `from` on; answers how far it got.
+    int writeFrom(const unsigned char* record, int from);
+    // Writes the rest of a record left unfinished when the link last
+    // stopped; false while some of it is still unwritten.
+    bool finishUnsentRecord();
+
+    // Transmit side only (one transmit thread at a time, each started after
+    // the last one was joined): a record abandoned part-way, and how much of
+    // it the device has taken.
+    VPR_Comm mUnsent{};
+    int mUnsentFrom = 0;
 
     static VtspManager* sVm;
 };

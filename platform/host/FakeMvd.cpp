@@ -5,6 +5,7 @@
 // Mvd_GetCdc reports and Mvd_SetCdc replaces, and calls naming a stream that
 // is not open fail where the engine would need the stream's state.
 #include <map>
+#include <set>
 
 #include "CallRecorder.h"
 #include "Mvd.h"
@@ -18,6 +19,7 @@ struct MvdState {
     unsigned int nextId = 1;
     std::map<unsigned int, tagMVD_CODEC> streams;
     std::map<unsigned int, tagMVD_RTCP_STA> stats;
+    std::set<unsigned int> suspended;
     PFN_MVDEVNTPROC eventProc = nullptr;
 };
 
@@ -98,6 +100,11 @@ std::vector<unsigned int> openMvdStreams() {
     return ids;
 }
 
+std::vector<unsigned int> suspendedMvdStreams() {
+    std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+    return std::vector<unsigned int>(state().suspended.begin(), state().suspended.end());
+}
+
 }  // namespace hostfakes
 
 using namespace hostfakes;
@@ -122,6 +129,7 @@ int Mvd_Close(unsigned int iStrmId) {
     {
         std::lock_guard<std::mutex> lock(r.stateMutex());
         state().streams.erase(iStrmId);
+        state().suspended.erase(iStrmId);
     }
     return onStream("Mvd_Close", iStrmId);
 }
@@ -169,8 +177,23 @@ int Mvd_ArsSetParm(unsigned int iStrmId, int iMinBitRate, int iMaxBitRate, int i
                      argText(iFrameRate)});
 }
 
-int Mvd_SuspendAllStrm(void) { return recordCall("Mvd_SuspendAllStrm", {}); }
-int Mvd_ResumeAllStrm(void) { return recordCall("Mvd_ResumeAllStrm", {}); }
+int Mvd_SuspendAllStrm(void) {
+    const int result = recordCall("Mvd_SuspendAllStrm", {});
+    if (result == 0) {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        for (const auto& entry : state().streams) state().suspended.insert(entry.first);
+    }
+    return result;
+}
+
+int Mvd_ResumeAllStrm(void) {
+    const int result = recordCall("Mvd_ResumeAllStrm", {});
+    if (result == 0) {
+        std::lock_guard<std::mutex> lock(CallRecorder::instance().stateMutex());
+        state().suspended.clear();
+    }
+    return result;
+}
 
 int Mvd_TptEnableTmmbr(unsigned int iStrmId, int bEnable) {
     return onStream("Mvd_TptEnableTmmbr", iStrmId, {argText(bEnable)});

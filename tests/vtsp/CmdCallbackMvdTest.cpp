@@ -111,15 +111,25 @@ protected:
 }  // namespace
 
 TEST_F(CmdCallbackMvdTest, StreamLivesFromItsStartUntilItsEnd) {
-    EXPECT_EQ(5, boundStream(send(_VTSP_CMD_STREAM_VIDEO_START, 5)));  // the stream's reply goes back
+    StreamCommand start = streamCmd(_VTSP_CMD_STREAM_VIDEO_START, 5);
+    start.localVideoAsBwKbps = 500;
+    start.extmapId = 3;
+    start.extmapUri = "urn:3gpp:video-orientation";
+    EXPECT_EQ(5, boundStream(send(streamRecord(start))));  // the stream's reply goes back
     EXPECT_EQ((V{"parse: keep new stream, streamId 5"}), decisions());
     EXPECT_EQ(1u, dispatcher->streamCount());
-    ASSERT_NE(nullptr, dispatcher->stream(5));
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, dispatcher->stream(5)->mStat);
+    ASSERT_TRUE(dispatcher->snapshot(5));
+    const StreamSnapshot s = dispatcher->snapshot(5).value();
+    EXPECT_EQ((std::vector<int64_t>{5, 1, StreamInfoMvd::STREAM_SENDRECV, 6010, 5010, 96, 600000, 100000, 512000,
+                                    0xD0, 3, 1}),
+              (std::vector<int64_t>{s.streamId, s.mvdStreamId, s.stat, s.localPort, s.remotePort, s.payloadType,
+                                    s.rate.bitrate, s.rate.minBitrate, s.rate.maxBitrate, s.rtcpMask, s.orientationExtId,
+                                    s.procStartCnt}));
+    EXPECT_EQ((V{"10.0.0.1", "192.168.1.2", kFront, "Remote"}), (V{s.localIp, s.remoteIp, s.captureId, s.renderId}));
 
     EXPECT_EQ(nullptr, send(_VTSP_CMD_STREAM_VIDEO_MODITY, 5, VTSP_STREAM_DIR_SENDONLY));
     EXPECT_EQ((V{"exsited stream, streamId 5"}), decisions());
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, dispatcher->stream(5)->mStat);
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, dispatcher->snapshot(5)->stat);
 
     // The end drops the stream, and with it the engine stream is closed.
     EXPECT_EQ((V{"Mvd_CaptureDetach(1) = 0", "Mvd_ProcStop(1) = 0", "Mvd_Close(1) = 0"}),
@@ -127,7 +137,7 @@ TEST_F(CmdCallbackMvdTest, StreamLivesFromItsStartUntilItsEnd) {
     EXPECT_EQ((V{"exsited stream, streamId 5", "delelte the stream, streamId 5"}), decisions());
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "CmdclbMVD", "~StreamInfoMvd: Mvd_Close(1), stat 0"));
     EXPECT_EQ(0u, dispatcher->streamCount());
-    EXPECT_EQ(nullptr, dispatcher->stream(5));
+    EXPECT_FALSE(dispatcher->snapshot(5));
 
     // A modify to direction "ended" drops a known stream as well.
     send(_VTSP_CMD_STREAM_VIDEO_START, 6);
@@ -163,9 +173,9 @@ TEST_F(CmdCallbackMvdTest, CommandsForUnknownIdsKeepOnlyStreamsLeftAlive) {
     EXPECT_EQ((V{"Mvd_TptSetSend(0, 1) = 0", "Mvd_TptSetRecv(0, 0) = 0"}),
               callsOf([&] { EXPECT_EQ(nullptr, send(streamRecord(c))); }));
     EXPECT_EQ((V{"parse: keep new stream, streamId 6"}), decisions());
-    ASSERT_NE(nullptr, dispatcher->stream(6));
-    EXPECT_EQ(0u, dispatcher->stream(6)->mMvdStreamId);
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, dispatcher->stream(6)->mStat);
+    ASSERT_TRUE(dispatcher->snapshot(6));
+    EXPECT_EQ(0u, dispatcher->snapshot(6)->mvdStreamId);
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDONLY, dispatcher->snapshot(6)->stat);
     // Ending it has nothing to detach or close.
     EXPECT_EQ(V{}, callsOf([&] { send(_VTSP_CMD_STREAM_VIDEO_END, 6); }));
     EXPECT_EQ((V{"exsited stream, streamId 6", "delelte the stream, streamId 6"}), decisions());
@@ -187,9 +197,9 @@ TEST_F(CmdCallbackMvdTest, ConfigurationReachesOnlyExistingStreams) {
     EXPECT_EQ((V{"_VTSP_CMD_CONFIG, streamId -1", "exsited stream, streamId -1"}), decisions());
 
     EXPECT_EQ(2u, dispatcher->streamCount());  // configuration creates no stream
-    EXPECT_EQ(0x10, dispatcher->stream(5)->mRTCPEnableMask);  // 0x30 keeps just NACK
-    EXPECT_EQ(0x80, dispatcher->stream(0xFFFFFFFFu)->mRTCPEnableMask);
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, dispatcher->stream(5)->mStat);
+    EXPECT_EQ(0x10, dispatcher->snapshot(5)->rtcpMask);  // 0x30 keeps just NACK
+    EXPECT_EQ(0x80, dispatcher->snapshot(0xFFFFFFFFu)->rtcpMask);
+    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, dispatcher->snapshot(5)->stat);
 }
 
 TEST_F(CmdCallbackMvdTest, OtherCodesAreLoggedAndIgnored) {
@@ -261,7 +271,12 @@ TEST_F(CmdCallbackMvdTest, RenderNameAndReplacedImageFanOutInIdOrder) {
     // The send-only stream 3 (engine stream 2) only stores the name.
     EXPECT_EQ((V{"Mvd_SetUniqueName(3, \"RemoteView\") = 0", "Mvd_SetUniqueName(1, \"RemoteView\") = 0"}),
               callsOf([&] { dispatcher->setRenderId("RemoteView"); }));
-    EXPECT_STREQ("RemoteView", dispatcher->stream(3)->mRenderId);
+    EXPECT_STREQ("RemoteView", dispatcher->snapshot(3)->renderId);
+    V order;  // by stream id, with their engine streams
+    for (const StreamSnapshot& s : dispatcher->snapshots()) {
+        order.push_back(std::to_string(s.streamId) + "/" + std::to_string(s.mvdStreamId));
+    }
+    EXPECT_EQ((V{"3/2", "5/3", "8/1"}), order);
     EXPECT_EQ(V{}, callsOf([&] { dispatcher->setRenderId(nullptr); }));
 
     log.clear();
@@ -281,11 +296,10 @@ TEST_F(CmdCallbackMvdTest, RenderNameAndReplacedImageFanOutInIdOrder) {
 TEST_F(CmdCallbackMvdTest, DestructionClosesEveryKeptStream) {
     send(_VTSP_CMD_STREAM_VIDEO_START, 4);
     send(_VTSP_CMD_STREAM_VIDEO_START, 2);
-    // A stream held by someone else outlives the dispatcher.
-    std::shared_ptr<StreamInfoMvd> held = dispatcher->stream(4);
-    EXPECT_EQ((V{"Mvd_Close(2) = 0"}), callsOf([&] { dispatcher.reset(); }));
-    EXPECT_EQ((std::vector<unsigned>{1}), hostfakes::openMvdStreams());
-    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), callsOf([&] { held.reset(); }));
+    V closed = callsOf([&] { dispatcher.reset(); });
+    std::sort(closed.begin(), closed.end());
+    EXPECT_EQ((V{"Mvd_Close(1) = 0", "Mvd_Close(2) = 0"}), closed);
+    EXPECT_EQ(std::vector<unsigned>{}, hostfakes::openMvdStreams());
 }
 
 TEST_F(CmdCallbackMvdTest, SettersAndCommandsFromTwoThreadsStayConsistent) {
@@ -302,6 +316,8 @@ TEST_F(CmdCallbackMvdTest, SettersAndCommandsFromTwoThreadsStayConsistent) {
             dispatcher->setCodecParam(configs[i % 2]);
             dispatcher->sendReplacedImage(i % 3 == 0, "/x.jpg");
             if (i % 5 == 0) dispatcher->setCaptureId(nullptr);
+            // Diagnostics read the streams while commands change them.
+            for (const StreamSnapshot& s : dispatcher->snapshots()) EXPECT_NE(StreamInfoMvd::STREAM_ENDED, s.stat);
         }
     });
     for (int round = 0; round < kRounds; ++round) {
@@ -321,11 +337,11 @@ TEST_F(CmdCallbackMvdTest, SettersAndCommandsFromTwoThreadsStayConsistent) {
     EXPECT_EQ(4u, dispatcher->streamCount());
     std::vector<unsigned> kept;
     for (uint32_t id : kIds) {
-        std::shared_ptr<StreamInfoMvd> s = dispatcher->stream(id);
-        ASSERT_NE(nullptr, s);
-        EXPECT_EQ(id, s->mStreamId);
-        EXPECT_TRUE(s->isAlive());
-        kept.push_back(s->mMvdStreamId);
+        const std::optional<StreamSnapshot> s = dispatcher->snapshot(id);
+        ASSERT_TRUE(s);
+        EXPECT_EQ(id, s->streamId);
+        EXPECT_NE(StreamInfoMvd::STREAM_ENDED, s->stat);
+        kept.push_back(s->mvdStreamId);
     }
     std::sort(kept.begin(), kept.end());
     EXPECT_EQ(kept, hostfakes::openMvdStreams());

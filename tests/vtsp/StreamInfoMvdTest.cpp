@@ -34,6 +34,18 @@ const V kQuiet = {"Mvd_SetUniqueName(1, \"Remote\") = 0", "Mvd_GetCdc(1, \"H264\
 // The bind request answering a start of stream 5 on 10.0.0.1:6000.
 const std::string kBind = "bind 7, stream 5, 10.0.0.1:6000, type 0";
 
+// What a start with both ends and direction 4 asks of a fresh engine stream `id`.
+V startCalls(unsigned id) {
+    const std::string i = std::to_string(id);
+    return {"Mvd_Open(\"10.0.0.1\", 6000, out=" + i + ") = 0", "Mvd_TptSetSend(" + i + ", 1) = 0",
+            "Mvd_TptSetRecv(" + i + ", 1) = 0", "Mvd_SetRmtAddr(" + i + ", \"192.168.1.2\", 5000) = 0",
+            "Mvd_SetUniqueName(" + i + ", \"Remote\") = 0", "Mvd_GetCdc(" + i + ", \"H264\", {pt=0 br=0 fps=0 0x0}) = 0",
+            "Mvd_ArsSetEnable(" + i + ", 1) = 0", "Mvd_ArsSetParm(" + i + ", 100000, 960000, 20, 30) = 0",
+            "Mvd_SetCdc(" + i + ", {pt=96 br=600000 fps=30 480x640}) = 0", "Mvd_SetSendPayload(" + i + ", 96) = 0",
+            "Mvd_RedSetEnable(" + i + ", 0) = 0", "Mvd_ProcStart(" + i + ") = 0",
+            "Mvd_CaptureAttach(" + i + ", \"Camera 1, Facing front, Orientation 270\") = 0"};
+}
+
 V then(V first, const V& rest) {
     first.insert(first.end(), rest.begin(), rest.end());
     return first;
@@ -129,13 +141,7 @@ protected:
 }  // namespace
 
 TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
-    EXPECT_EQ((V{kOpen, "Mvd_TptSetSend(1, 1) = 0", "Mvd_TptSetRecv(1, 1) = 0",
-                 "Mvd_SetRmtAddr(1, \"192.168.1.2\", 5000) = 0", "Mvd_SetUniqueName(1, \"Remote\") = 0",
-                 "Mvd_GetCdc(1, \"H264\", {pt=0 br=0 fps=0 0x0}) = 0", "Mvd_ArsSetEnable(1, 1) = 0",
-                 "Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0", "Mvd_SetCdc(1, " + kStartCodec + ") = 0",
-                 "Mvd_SetSendPayload(1, 96) = 0", "Mvd_RedSetEnable(1, 0) = 0", "Mvd_ProcStart(1) = 0",
-                 kAttachFront}),
-              run(start(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_EQ(startCalls(1), run(start(VTSP_STREAM_DIR_SENDRECV)));
     // A stream command read through the configuration view names no RTCP
     // template, so the initial mask stays and no feedback switch is touched.
     EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START",
@@ -155,6 +161,14 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
     EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
     EXPECT_EQ(kVtspId, stream->mStreamId);
     EXPECT_EQ(kBind, bindText(reply));  // the local end, in host order until the link sends it
+
+    // A second start gives the running engine stream back before opening
+    // another, which is then set up in full.
+    EXPECT_EQ(then({"Mvd_CaptureDetach(1) = 0", "Mvd_ProcStop(1) = 0", "Mvd_Close(1) = 0"}, startCalls(2)),
+              run(start(VTSP_STREAM_DIR_SENDRECV)));
+    EXPECT_EQ(kBind, bindText(reply));
+    EXPECT_EQ(std::vector<unsigned>{2}, hostfakes::openMvdStreams());
+    EXPECT_EQ(1, stream->mProcStartCnt);
 }
 
 TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
@@ -334,6 +348,20 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_EQ("E codecParamConfig: SetCodec failed !!!", lines().back());
     EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
     EXPECT_EQ(0, stream->mProcStartCnt);
+
+    // Refused on a running stream, after every engine stream was suspended
+    // for it: they go on with the codec they had.
+    stream = makeStream();
+    hostfakes::reset();
+    startRunning();
+    hostfakes::setResult("Mvd_SetCdc", -1);
+    StreamCommand newPayload = modify(VTSP_STREAM_DIR_SENDRECV);
+    newPayload.encodeType[0] = 100;
+    const V refused = run(newPayload);
+    EXPECT_THAT(refused, Contains("Mvd_SuspendAllStrm() = 0"));
+    EXPECT_EQ("Mvd_ResumeAllStrm() = 0", refused.back());
+    EXPECT_EQ(std::vector<unsigned>{}, hostfakes::suspendedMvdStreams());
+    EXPECT_FALSE(stream->mParamChanged);
 }
 
 TEST_F(StreamInfoMvdTest, OnlyTheVideoOrientationUriSetsTheExtension) {
@@ -447,13 +475,13 @@ TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive)
     EXPECT_THAT(calls, Contains("Mvd_SetCdc(1, " + kStartCodec + ") = 0"));
     EXPECT_EQ("Mvd_ResumeAllStrm() = 0", calls.back());
 
-    // A held stream takes the codec without suspending or resuming the
-    // engine, and drops a pending resume (here from a remote port change
-    // whose modify stopped at a refused encoder).
+    // A modify that stops at a refused encoder still lifts the suspend of
+    // its remote port change; the held stream then takes the codec without
+    // suspending or resuming the engine.
     StreamCommand hold = command(_VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_STREAM_DIR_INACTIVE, 5004);
     hold.encoder = 1;
-    run(hold);
-    ASSERT_TRUE(stream->mParamChanged);
+    EXPECT_EQ("Mvd_ResumeAllStrm() = 0", run(hold).back());
+    EXPECT_FALSE(stream->mParamChanged);
     ASSERT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
     EXPECT_EQ((V{"Mvd_GetCdc(1, \"H264\", " + kStartCodec + ") = 0",
                  "Mvd_SetCdc(1, {pt=96 br=400000 fps=30 352x288}) = 0"}),

@@ -109,7 +109,7 @@ TEST_F(VtspFaultTest, RecordArrivingOneByteAtATimeIsHandledOnce) {
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(1u, recvLines());
     EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
-    EXPECT_NE(nullptr, link.mCmdCallback->stream(7));
+    EXPECT_TRUE(link.mCmdCallback->snapshot(7));
 }
 
 TEST_F(VtspFaultTest, Sigusr1StormLosesAndRepeatsNothing) {
@@ -227,8 +227,8 @@ TEST_F(VtspFaultTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
     EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
     for (int cycle = 0; cycle < 3; ++cycle) {
         for (int i = 0; i < kPerPhase; ++i) {
-            EXPECT_NE(nullptr, link.mCmdCallback->stream(100 * cycle + 1 + i));
-            EXPECT_EQ(nullptr, link.mCmdCallback->stream(100 * cycle + 50 + i));
+            EXPECT_TRUE(link.mCmdCallback->snapshot(100 * cycle + 1 + i));
+            EXPECT_FALSE(link.mCmdCallback->snapshot(100 * cycle + 50 + i));
         }
     }
 }

@@ -164,7 +164,7 @@ void Simulator::run(const ScenarioStep& step) {
 
 std::string Simulator::step(const ScenarioStep& step) {
     mStartFoundStream = step.actor == Actor::kModem && step.modem.kind == StepSyntax::Kind::kStart &&
-                        android::VtspManager::getInstance()->mCmdCallback->stream(step.modem.stream.streamId) != nullptr;
+                        android::VtspManager::getInstance()->mCmdCallback->snapshot(step.modem.stream.streamId).has_value();
     // The client's death reaches the engine only through the death link of
     // a callback it still has registered.
     mDeathEndsCall = step.actor == Actor::kClient && step.verb == "die" && mClient.hasCallback();

@@ -15,9 +15,6 @@ using Actor = ScenarioStep::Actor;
 
 namespace {
 
-// The stream ids the generator and most scenarios use.
-const uint32_t kStreamIds[] = {1, 2, 3, 7};
-
 bool carriesLocalEnd(const StepSyntax::Step& start) {
     const android::OSAL_NetAddress& a = start.stream.localAddr;
     return a.type <= 3 && a.port != 0;
@@ -88,10 +85,8 @@ std::string Simulator::checkStreams() {
     // The media engine's open streams are the dispatcher's streams, and the
     // engine's loopback stream while loopback mode runs: nothing leaks.
     std::set<unsigned int> held;
-    const auto dispatcher = android::VtspManager::getInstance()->mCmdCallback;
-    for (uint32_t id : kStreamIds) {
-        const auto stream = dispatcher->stream(id);
-        if (stream != nullptr && stream->mMvdStreamId != 0) held.insert(stream->mMvdStreamId);
+    for (const android::StreamSnapshot& s : android::VtspManager::getInstance()->mCmdCallback->snapshots()) {
+        if (s.mvdStreamId != 0) held.insert(s.mvdStreamId);
     }
     const android::VideoCallEngineImpl* engine = android::VideoCallEngineImpl::getInstance();
     std::set<unsigned int> open;

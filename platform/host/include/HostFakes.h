@@ -57,6 +57,8 @@ void setMvdCodec(unsigned int streamId, const tagMVD_CODEC& codec);
 bool getMvdCodec(unsigned int streamId, tagMVD_CODEC* codec);
 // Streams that are open in the fake engine, ascending.
 std::vector<unsigned int> openMvdStreams();
+// Open streams suspended by Mvd_SuspendAllStrm and not resumed since, ascending.
+std::vector<unsigned int> suspendedMvdStreams();
 
 // Video library: calls the listener the system registered, on the calling
 // thread, as the library's event thread would. False when none is registered.
