@@ -174,6 +174,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
             continue;
         }
         vm->mRxQueue.pushAndSignal(CmdBuffer::fromRecord(*record));
+        vm->mRxQueue.waitForRoom(kRxHighWater, kRxLowWater);
     }
     vm->mRxEnded = true;
     return nullptr;
