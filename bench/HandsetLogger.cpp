@@ -5,6 +5,7 @@
 #include <time.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
 #include <cstdint>
 #include <cstdio>
@@ -42,8 +43,10 @@ HandsetLogger::HandsetLogger(__android_logger_function previous) : mPrevious(pre
 HandsetLogger::~HandsetLogger() {
     __android_log_set_logger(mPrevious);
     sWriter = -1;
-    mDraining = false;
-    (void)!send(mWriter, "", 0, 0);  // wakes the drainer
+    // An empty datagram, which no line ever is, tells the drainer to finish
+    // once it has taken every line queued before it.
+    while (send(mWriter, "", 0, 0) < 0 && errno == EINTR) {
+    }
     mDrainer.join();
     close(mWriter);
     close(mReader);
@@ -68,7 +71,8 @@ void HandsetLogger::log(const struct __android_logger_data* data, const char* me
 
 void HandsetLogger::drain() {
     char line[5 * 1024];
-    while (recv(mReader, line, sizeof(line), 0) >= 0 || errno == EINTR) {
-        if (!mDraining) break;
+    for (;;) {
+        const ssize_t n = recv(mReader, line, sizeof(line), 0);
+        if (n == 0 || (n < 0 && errno != EINTR)) break;
     }
 }

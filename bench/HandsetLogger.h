@@ -6,7 +6,6 @@
 
 #include <android/log.h>
 
-#include <atomic>
 #include <thread>
 
 class HandsetLogger {
@@ -24,7 +23,6 @@ private:
     __android_logger_function mPrevious;
     int mWriter = -1;
     int mReader = -1;
-    std::atomic<bool> mDraining{true};
     std::thread mDrainer;
 };
 
