@@ -44,8 +44,8 @@ public:
     // mark; meanwhile the pipe's own buffer fills and the modem's writes
     // wait. Nothing is refused or reordered. The gap between the marks lets
     // the receiver read a batch per wake-up.
-    static constexpr size_t kRxHighWater = 32;
-    static constexpr size_t kRxLowWater = 16;
+    static constexpr size_t kRxHighWater = 64;
+    static constexpr size_t kRxLowWater = 32;
 
     // A link of its own on `devName`; tests and tools use this to run a link
     // on a pseudo-terminal without touching the process singleton.
