@@ -408,8 +408,8 @@ long long heapPerQueuedCommand(size_t commands) {
 // How far heap in use moves between samples when nothing is kept, so that
 // flatness is judged against the allocator's own behaviour: commands made on
 // one thread and released on another through a queue, as the link does,
-// sampled each time the queue is drained. The tolerance is twice the widest
-// spread seen, plus one command that may still be on its way to release.
+// sampled each time every command has been released. The tolerance is twice
+// the widest spread seen plus one command's allocation.
 long long allocatorTolerance(size_t commands) {
     using Queue = android::CmdLockQueue<std::shared_ptr<android::CmdBuffer>>;
     const VPR_Comm record = modifyRecord(kFirstStreamId);
@@ -432,8 +432,9 @@ long long allocatorTolerance(size_t commands) {
             queue.pushAndSignal(android::CmdBuffer::fromRecord(record));
             queue.waitForRoom(android::VtspManager::kRxHighWater, android::VtspManager::kRxLowWater);
         }
-        while (queue.size() != 0) std::this_thread::sleep_for(std::chrono::milliseconds(1));
-        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        while (queue.size() != 0 || android::CmdBuffer::con.load() != android::CmdBuffer::des.load()) {
+            std::this_thread::sleep_for(std::chrono::milliseconds(1));
+        }
         const long long heap = static_cast<long long>(processusage::heapInUse());
         if (s == 0) low = high = heap;
         low = std::min(low, heap);
@@ -508,6 +509,19 @@ bool waitHandled(size_t count) {
     return true;
 }
 
+// Waits until the handling thread has taken `count` commands and every
+// command and reply made so far has been released again (the link holds
+// nothing in flight); false when it stops making progress for seconds.
+bool waitDrained(size_t count) {
+    if (!waitHandled(count)) return false;
+    const auto start = Clock::now();
+    while (android::CmdBuffer::con.load() != android::CmdBuffer::des.load()) {
+        if (secondsSince(start) > 2) return false;
+        std::this_thread::sleep_for(std::chrono::milliseconds(1));
+    }
+    return true;
+}
+
 // The modem writes the flood as fast as the pipe takes it from a thread of
 // its own, pausing once half-way until this thread has sampled memory; this
 // thread reads the bind requests and checks that they answer the starts in
@@ -556,7 +570,7 @@ FloodFigures measureFlood(ModemPty& pty, const Options& o) {
             }
         };
         readBinds(0, half);
-        if (waitHandled(half)) sample(half);
+        if (waitDrained(half)) sample(half);
         {
             std::lock_guard<std::mutex> lock(mutex);
             resume = true;
@@ -566,7 +580,7 @@ FloodFigures measureFlood(ModemPty& pty, const Options& o) {
         waitHandled(total);
         f.seconds = secondsSince(start);
         modem.join();
-        sample(total);
+        if (waitDrained(total)) sample(total);
         f.written = written.load();
         f.handled = sDumped.load();
         f.streamsLeft = link.mCmdCallback->streamCount();
