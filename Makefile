@@ -24,8 +24,8 @@ msc: build
 	mscgen -T png -o $(BUILD)/call.png $(BUILD)/call.msc
 	@echo "ladder diagram: $(BUILD)/call.png"
 
-# The link against the pipe's own limit (docs/performance.md); about a
-# minute. BENCH_ARGS=--quick for a few seconds.
+# The link against the pipe's own limit (docs/performance.md); one to two
+# minutes. BENCH_ARGS=--quick for a few seconds.
 bench: build
 	$(BUILD)/vtsp-bench $(BENCH_ARGS)
 

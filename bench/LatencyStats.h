@@ -22,4 +22,20 @@ private:
     std::vector<long long> mSamples;
 };
 
+// One figure measured in several repetitions: judged on its median, with
+// the lowest and highest value as its spread.
+class Repeated {
+public:
+    void add(double value) { mValues.push_back(value); }
+    bool empty() const { return mValues.empty(); }
+    double median() const;
+    double min() const;
+    double max() const;
+    // Spread relative to the median: (max - min) / median.
+    double relativeSpread() const;
+
+private:
+    std::vector<double> mValues;
+};
+
 #endif  // QUELLBORN_BENCH_LATENCYSTATS_H

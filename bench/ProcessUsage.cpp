@@ -3,6 +3,7 @@
 #include <dirent.h>
 #include <malloc.h>
 #include <time.h>
+#include <unistd.h>
 
 #include <fstream>
 #include <sstream>
@@ -34,6 +35,31 @@ std::string firstLine(const std::string& path) {
 
 size_t residentBytes() {
     return static_cast<size_t>(statusField("/proc/self/status", "VmRSS")) * 1024;
+}
+
+size_t peakResidentBytes() {
+    return static_cast<size_t>(statusField("/proc/self/status", "VmHWM")) * 1024;
+}
+
+bool resetPeakResident() {
+    std::ofstream out("/proc/self/clear_refs");
+    out << "5";
+    out.flush();
+    return static_cast<bool>(out);
+}
+
+double machineBusySeconds() {
+    // First line: "cpu user nice system idle iowait irq softirq steal ...", in clock ticks.
+    std::istringstream in(firstLine("/proc/stat"));
+    std::string cpu;
+    long long user = 0, nice = 0, system = 0, idle = 0, iowait = 0, irq = 0, softirq = 0, steal = 0;
+    in >> cpu >> user >> nice >> system >> idle >> iowait >> irq >> softirq >> steal;
+    return static_cast<double>(user + nice + system + irq + softirq + steal) / static_cast<double>(sysconf(_SC_CLK_TCK));
+}
+
+unsigned cpuCount() {
+    const long n = sysconf(_SC_NPROCESSORS_ONLN);
+    return n > 0 ? static_cast<unsigned>(n) : 1;
 }
 
 size_t heapInUse() {

@@ -11,10 +11,19 @@ namespace processusage {
 
 // VmRSS of /proc/self/status, in bytes.
 size_t residentBytes();
+// VmHWM: the most resident memory so far, in bytes; resetPeakResident()
+// starts it again from the current figure (false where the kernel cannot).
+size_t peakResidentBytes();
+bool resetPeakResident();
 // Bytes handed out by malloc and not yet freed.
 size_t heapInUse();
 // CPU time of every thread of the process so far, in nanoseconds.
 long long processCpuNs();
+
+// CPU time every CPU of the machine spent busy so far (all processes, the
+// hypervisor's steal included), in seconds, and the number of CPUs.
+double machineBusySeconds();
+unsigned cpuCount();
 
 struct ThreadUsage {
     long long cpuNs = 0;       // user + system time the scheduler ran it

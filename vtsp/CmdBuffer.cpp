@@ -17,6 +17,26 @@ constexpr size_t kDumpSize = 1024;
 // operation acts on keeps translate, compose and print from touching it.
 constexpr VPR_CommType kNoBody = static_cast<VPR_CommType>(0xFFFFFFFFu);
 
+// Each stream start turns two addresses into text; writing the digits
+// directly costs a fraction of formatting them one by one with snprintf.
+char* putDecimal(char* p, unsigned value) {
+    if (value >= 100) *p++ = static_cast<char>('0' + value / 100);
+    if (value >= 10) *p++ = static_cast<char>('0' + value / 10 % 10);
+    *p++ = static_cast<char>('0' + value % 10);
+    return p;
+}
+
+char* putHex(char* p, unsigned value) {
+    static const char kDigits[] = "0123456789abcdef";
+    bool started = false;
+    for (int shift = 12; shift >= 0; shift -= 4) {
+        const unsigned digit = (value >> shift) & 0xfu;
+        started = started || digit != 0 || shift == 0;
+        if (started) *p++ = kDigits[digit];
+    }
+    return p;
+}
+
 uint32_t littleEndianIpv4(const uint8_t (&octets)[4]) {
     return uint32_t(octets[0]) | uint32_t(octets[1]) << 8 | uint32_t(octets[2]) << 16 |
            uint32_t(octets[3]) << 24;
@@ -32,9 +52,12 @@ CmdBuffer::CmdBuffer() : type(kNoBody), length(0), cmd{} {
 }
 
 CmdBuffer::CmdBuffer(VPR_CommType type_, const unsigned char* bytes)
-        : type(type_), length(bodyLengthOf(type_)), cmd{} {
+        : type(type_), length(bodyLengthOf(type_)) {
     if (bytes == nullptr) length = 0;
-    memcpy(cmd, bytes == nullptr ? cmd : bytes, length);
+    // Every command passes through here: copy the body and zero only the
+    // rest, rather than zeroing the whole area first.
+    if (length > 0) memcpy(cmd, bytes, length);
+    memset(cmd + length, 0, sizeof(cmd) - length);
     ++con;
 }
 
@@ -122,24 +145,27 @@ void CmdBuffer::print() const {
              int(v.localVideoAsBwKbps), int(v.remoteVideoAsBwKbps),
              int(v.encodeType[0]), int(v.encodeType[1]),
              int(v.extension), int(v.extmapId), uri);
-    __android_log_print(ANDROID_LOG_INFO, kTag, "%s", text);
+    // The text is complete: hand it over as it is instead of formatting it a second time.
+    __android_log_write(ANDROID_LOG_INFO, kTag, text);
 }
 
 void ConvertIpToString(char* out, const void* addr, bool ipv4) {
-    size_t used = 0;
+    char* p = out;
     if (ipv4) {
         const uint8_t* octets = static_cast<const uint8_t*>(addr);
         for (int i = 0; i < 4; ++i) {
-            used += snprintf(out + used, kIpTextSize - used, "%d.", int(octets[i]));
+            p = putDecimal(p, octets[i]);
+            *p++ = '.';
         }
     } else {
         uint16_t groups[8];
         memcpy(groups, addr, sizeof(groups));
         for (uint16_t group : groups) {
-            used += snprintf(out + used, kIpTextSize - used, "%x:", unsigned(group));
+            p = putHex(p, group);
+            *p++ = ':';
         }
     }
-    out[used - 1] = '\0';  // drop the trailing separator
+    p[-1] = '\0';  // the trailing separator
 }
 
 }  // namespace android

@@ -3,6 +3,8 @@
 // Exactly one consumer waits on a queue; a push and a close each wake one
 // waiter. The owner pauses a queue with reset (pushes refused, consumer keeps
 // waiting) and shuts it with destroy (consumer woken, every wait returns false).
+// The queue has no capacity of its own: a producer that must not run ahead
+// of its consumer without bound asks waitForRoom after pushing.
 #ifndef QUELLBORN_VTSP_CMDLOCKQUEUE_H
 #define QUELLBORN_VTSP_CMDLOCKQUEUE_H
 
@@ -27,12 +29,14 @@ public:
         // timed wait immune to wall-clock changes on the handset.
         pthread_condattr_setclock(&attr, CLOCK_MONOTONIC);
         pthread_cond_init(&mCond, &attr);
+        pthread_cond_init(&mRoomCond, &attr);
         pthread_condattr_destroy(&attr);
         pthread_mutex_init(&mMutex, nullptr);
     }
 
     ~CmdLockQueue() {
         pthread_cond_destroy(&mCond);
+        pthread_cond_destroy(&mRoomCond);
         pthread_mutex_destroy(&mMutex);
     }
 
@@ -62,21 +66,44 @@ public:
 
     // Takes the front element into `out`; false once the queue is closed.
     bool waitAndPop(T& out) {
-        ScopedPthreadLock lock(mMutex);
-        if (mState == QUEUE_CLOSED) return false;
-        while (mQueue.empty()) {
-            pthread_cond_wait(&mCond, &mMutex);
+        bool roomMade = false;
+        {
+            ScopedPthreadLock lock(mMutex);
             if (mState == QUEUE_CLOSED) return false;
+            while (mQueue.empty()) {
+                pthread_cond_wait(&mCond, &mMutex);
+                if (mState == QUEUE_CLOSED) return false;
+            }
+            out = mQueue.front();
+            mQueue.pop_front();
+            roomMade = mRoomBelow != 0 && mQueue.size() < mRoomBelow;
+            if (roomMade) mRoomBelow = 0;  // one wake-up per wait for room
         }
-        out = mQueue.front();
-        mQueue.pop_front();
+        if (roomMade) pthread_cond_signal(&mRoomCond);
         return true;
     }
 
-    void reset() {
+    // Returns at once while fewer than `high` elements are queued. Otherwise
+    // waits until the consumer has taken the queue below `low`, or until the
+    // queue is reset or closed (which empties it), so that shutting the queue
+    // also ends this wait. Nothing is refused: pushes are accepted meanwhile.
+    void waitForRoom(size_t high, size_t low) {
         ScopedPthreadLock lock(mMutex);
-        drain();
-        mState = QUEUE_STOPPED;
+        if (mQueue.size() < high) return;
+        while (mState == QUEUE_RUNNING && mQueue.size() >= low) {
+            mRoomBelow = low;
+            pthread_cond_wait(&mRoomCond, &mMutex);
+        }
+        mRoomBelow = 0;
+    }
+
+    void reset() {
+        {
+            ScopedPthreadLock lock(mMutex);
+            drain();
+            mState = QUEUE_STOPPED;
+        }
+        pthread_cond_broadcast(&mRoomCond);
     }
 
     void destroy() {
@@ -86,6 +113,7 @@ public:
             mState = QUEUE_CLOSED;
         }
         pthread_cond_signal(&mCond);
+        pthread_cond_broadcast(&mRoomCond);
     }
 
     // Snapshot for diagnostics and tests.
@@ -105,6 +133,11 @@ public:
         ScopedPthreadLock lock(mMutex);
         return Depth{mQueue.size(), mHighest};
     }
+    // The most elements the queue has held at once.
+    size_t peakSize() {
+        ScopedPthreadLock lock(mMutex);
+        return mHighest;
+    }
 
 private:
     // Releases the elements one by one from the front, under the lock.
@@ -117,6 +150,8 @@ private:
     pthread_mutex_t mMutex;
     int mState = QUEUE_CLOSED;
     size_t mHighest = 0;
+    pthread_cond_t mRoomCond;  // the producer's wait for room
+    size_t mRoomBelow = 0;     // while the producer waits: the size that wakes it
 };
 
 }  // namespace android

@@ -245,6 +245,7 @@ void* VtspManager::cmdRxFunc(void* arg) {
             continue;
         }
         if (!vm->mRxQueue.pushAndSignal(CmdBuffer::fromRecord(*record))) ++vm->mCounters.commandsRefused;
+        vm->mRxQueue.waitForRoom(kRxHighWater, kRxLowWater);
     }
     vm->mCounters.rxRunning = false;
     vm->mRxEnded = true;

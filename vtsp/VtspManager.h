@@ -41,6 +41,16 @@ public:
     // the first caller, before any other user exists).
     static VtspManager* getInstance();
 
+    // A modem writing faster than commands are handled must not grow the
+    // receive queue without bound (each queued command holds a few
+    // kilobytes). At the high-water mark the receive thread stops reading
+    // until the handling thread has taken the queue below the low-water
+    // mark; meanwhile the pipe's own buffer fills and the modem's writes
+    // wait. Nothing is refused or reordered. The gap between the marks lets
+    // the receiver read a batch per wake-up.
+    static constexpr size_t kRxHighWater = 64;
+    static constexpr size_t kRxLowWater = 32;
+
     // A link of its own on `devName`; tests and tools use this to run a link
     // on a pseudo-terminal without touching the process singleton.
     explicit VtspManager(const char* devName);

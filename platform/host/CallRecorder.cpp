@@ -85,7 +85,8 @@ CallRecorder::~CallRecorder() {
 }
 
 int CallRecorder::resultFor(const std::string& function, int natural) {
-    std::lock_guard<std::mutex> lock(mMutex);
+    std::unique_lock<std::mutex> lock(mMutex);
+    mReleased.wait(lock, [&] { return mHeld.empty() || mHeld != function; });
     const auto it = mResults.find(function);
     return it == mResults.end() ? natural : it->second;
 }
@@ -109,8 +110,10 @@ void CallRecorder::reset() {
         std::lock_guard<std::mutex> lock(mMutex);
         mCalls.clear();
         mResults.clear();
+        mHeld.clear();
         hooks = mResetHooks;
     }
+    mReleased.notify_all();
     for (auto& hook : hooks) hook();
 }
 
@@ -127,6 +130,19 @@ void CallRecorder::setResult(const std::string& function, int result) {
 void CallRecorder::clearResult(const std::string& function) {
     std::lock_guard<std::mutex> lock(mMutex);
     mResults.erase(function);
+}
+
+void CallRecorder::holdCalls(const std::string& function) {
+    std::lock_guard<std::mutex> lock(mMutex);
+    mHeld = function;
+}
+
+void CallRecorder::releaseCalls() {
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        mHeld.clear();
+    }
+    mReleased.notify_all();
 }
 
 void CallRecorder::setRecording(bool keep) {
@@ -192,6 +208,8 @@ void setResult(const std::string& function, int result) {
     CallRecorder::instance().setResult(function, result);
 }
 void clearResult(const std::string& function) { CallRecorder::instance().clearResult(function); }
+void holdCalls(const std::string& function) { CallRecorder::instance().holdCalls(function); }
+void releaseCalls() { CallRecorder::instance().releaseCalls(); }
 void setTrace(const char* target) { CallRecorder::instance().setTrace(target); }
 void setRecording(bool keep) { CallRecorder::instance().setRecording(keep); }
 

@@ -3,6 +3,7 @@
 #define QUELLBORN_HOST_CALLRECORDER_H
 
 #include <cstdio>
+#include <condition_variable>
 #include <functional>
 #include <map>
 #include <mutex>
@@ -41,6 +42,8 @@ public:
     std::vector<Call> calls();
     void setResult(const std::string& function, int result);
     void clearResult(const std::string& function);
+    void holdCalls(const std::string& function);
+    void releaseCalls();
     void setTrace(const char* target);
     void setRecording(bool keep);
 
@@ -59,6 +62,8 @@ private:
     std::mutex mStateMutex;
     std::vector<Call> mCalls;
     std::map<std::string, int> mResults;
+    std::string mHeld;  // calls of this function wait for mReleased
+    std::condition_variable mReleased;
     std::vector<std::function<void()>> mResetHooks;
     FILE* mTrace = nullptr;
     bool mOwnsTrace = false;

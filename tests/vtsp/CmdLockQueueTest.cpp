@@ -1,6 +1,7 @@
 // The blocking queue between the link's threads: refusal while not running,
-// FIFO order, waking and closing a waiting consumer, pausing with reset, and
-// the references it holds on the commands that pass through it.
+// FIFO order, waking and closing a waiting consumer, pausing with reset, a
+// producer waiting for room, and the references it holds on the commands
+// that pass through it.
 #include <android/log.h>
 #include <gtest/gtest.h>
 #include <sys/syscall.h>
@@ -54,17 +55,22 @@ char taskState(pid_t tid) {
     return paren == std::string::npos || paren + 2 >= text.size() ? '?' : text[paren + 2];
 }
 
-// A consumer thread blocked in waitAndPop. Its result is a future, so a test
-// can tell "still waiting" from "returned" without sleeping blindly.
+int32_t pop(Queue& queue) {
+    Elem elem;
+    return queue.waitAndPop(elem) ? codeOf(elem) : -2;
+}
+
+// A thread blocked in waitAndPop (or in another wait given as `body`). Its
+// result is a future, so a test can tell "still waiting" from "returned"
+// without sleeping blindly.
 class Consumer {
 public:
-    explicit Consumer(Queue& queue) : mQueue(queue) {
+    explicit Consumer(Queue& queue, int32_t (*body)(Queue&) = pop) : mQueue(queue) {
         std::promise<pid_t> tid;
         std::future<pid_t> tidReady = tid.get_future();
-        mResult = std::async(std::launch::async, [&queue, tid = std::move(tid)]() mutable {
+        mResult = std::async(std::launch::async, [&queue, body, tid = std::move(tid)]() mutable {
             tid.set_value(static_cast<pid_t>(syscall(SYS_gettid)));
-            Elem elem;
-            return queue.waitAndPop(elem) ? codeOf(elem) : -2;
+            return body(queue);
         });
         mTid = tidReady.get();
     }
@@ -74,7 +80,7 @@ public:
         if (!mResult.valid() || returnedWithin(0ms)) return;
         mQueue.destroy();
         if (!returnedWithin(2s)) {
-            fprintf(stderr, "consumer still blocked in waitAndPop after destroy\n");
+            fprintf(stderr, "consumer still blocked in the queue after destroy\n");
             std::abort();
         }
     }
@@ -194,4 +200,37 @@ TEST(CmdLockQueue, ResetDiscardsRefusesAndKeepsTheConsumerWaitingUntilRestarted)
     queue.start();
     queue.pushAndSignal(command(15));
     EXPECT_EQ(15, consumer.result());  // nothing from before the reset survived
+}
+
+TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMarkOrAShutdown) {
+    const auto waitForRoom = [](Queue& q) {
+        q.waitForRoom(4, 2);
+        return int32_t{0};
+    };
+    Queue queue;
+    queue.start();
+    for (int32_t code : {81, 82, 83}) queue.pushAndSignal(command(code));
+    EXPECT_EQ(0, waitForRoom(queue));  // below the high mark: returns at once
+    queue.pushAndSignal(command(84));
+    Consumer producer(queue, waitForRoom);
+    ASSERT_TRUE(producer.sleeping());
+    Elem out;
+    for (int32_t code : {81, 82}) {
+        ASSERT_TRUE(queue.waitAndPop(out));
+        EXPECT_EQ(code, codeOf(out));
+    }
+    EXPECT_FALSE(producer.returnedWithin(50ms));  // two left: not below the low mark yet
+    ASSERT_TRUE(queue.waitAndPop(out));
+    EXPECT_EQ(0, producer.result());
+    EXPECT_EQ(4u, queue.peakSize());
+
+    // Pausing or closing the queue empties it, and so ends the wait too.
+    for (void (Queue::*shut)() : {&Queue::reset, &Queue::destroy}) {
+        queue.start();
+        while (queue.size() < 4) queue.pushAndSignal(command(85));
+        Consumer waiting(queue, waitForRoom);
+        ASSERT_TRUE(waiting.sleeping());
+        (queue.*shut)();
+        EXPECT_EQ(0, waiting.result());
+    }
 }

@@ -1,6 +1,7 @@
 // The modem command link run on a raw pseudo-terminal with its real threads:
 // record assembly and routing, a whole call from the modem's side, pausing,
-// shutdown in every state, an unusable device and garbage on the pipe.
+// shutdown in every state, a flood held back at the pipe, an unusable device
+// and garbage on the pipe.
 #include <android/log.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -9,9 +10,11 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <filesystem>
 #include <fstream>
+#include <future>
 #include <random>
 #include <string>
 #include <thread>
@@ -53,6 +56,11 @@ std::vector<std::pair<std::string, char>> threads() {
         out.emplace_back(name, paren != std::string::npos && paren + 2 < stat.size() ? stat[paren + 2] : '?');
     }
     return out;
+}
+
+size_t threadsNamed(const std::string& name) {
+    const auto all = threads();
+    return static_cast<size_t>(std::count_if(all.begin(), all.end(), [&](const auto& t) { return t.first == name; }));
 }
 
 // True when each of the link's three threads exists exactly `count` times.
@@ -150,6 +158,17 @@ protected:
         return "target " + std::to_string(b.targetModule) + ", type " + std::to_string(b.type) + ", length " +
                std::to_string(b.recordLength) + ", code " + std::to_string(b.code) + ": stream " +
                std::to_string(b.streamId) + " at " + endpointText(b.addr);
+    }
+
+    // Starts the link with the media engine not answering: the handling
+    // thread takes a first start and waits in the engine, so every later
+    // command stays queued.
+    void startLinkWithHandlingHeld() {
+        hostfakes::holdCalls("Mvd_Open");
+        startLink();
+        pty.writeRecord(streamRecord(startCommand(1)));
+        ASSERT_TRUE(eventually([&] { return log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)) &&
+                                            link.mRxQueue.size() == 0; }));
     }
 
     // The link's own lines apart from the three thread entries, in order.
@@ -348,6 +367,62 @@ TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirst) {
     running.reset();
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
     EXPECT_EQ(1u, openDescriptorsOn(pty.devicePath()));
+}
+
+TEST_F(VtspManagerTest, FloodWaitsAtTheHighWaterMarkAndIsHandledInOrder) {
+    startLinkWithHandlingHeld();
+    constexpr uint32_t kFlood = 300;
+    std::atomic<uint32_t> written{1};
+    std::thread modem([&] {
+        for (uint32_t id = 2; id <= kFlood; ++id, ++written) pty.writeRecord(streamRecord(startCommand(id)));
+    });
+    struct Finish {
+        std::thread& modem;
+        ~Finish() {
+            hostfakes::releaseCalls();
+            modem.join();
+        }
+    } finish{modem};
+
+    const size_t high = VtspManager::kRxHighWater;
+    ASSERT_TRUE(eventually([&] { return link.mRxQueue.size() == high; }));
+    std::this_thread::sleep_for(200ms);  // time for a receiver that kept reading to show it
+    EXPECT_EQ(high, link.mRxQueue.size());
+    EXPECT_LT(written.load(), kFlood);  // the full pipe holds the modem's writes back
+
+    hostfakes::releaseCalls();
+    for (uint32_t id = 1; id <= kFlood; ++id) {
+        ASSERT_EQ(kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000", readBind());
+    }
+    EXPECT_EQ(high, link.mRxQueue.peakSize());
+    EXPECT_EQ(kFlood, hostfakes::callCount("Mvd_Open"));
+}
+
+TEST_F(VtspManagerTest, StopAndDestroyEndAReceiverWaitingForRoom) {
+    startLinkWithHandlingHeld();
+    const size_t high = VtspManager::kRxHighWater;
+    uint32_t id = 2;
+    const auto write = [&](size_t n) {
+        for (size_t i = 0; i < n; ++i) pty.writeRecord(streamRecord(startCommand(id++)));
+    };
+    write(high);
+    ASSERT_TRUE(eventually([&] { return link.mRxQueue.size() == high; }));
+    write(2);  // these stay in the pipe, which holds only a few records
+
+    // Stopping empties the queue: the receiver reads again, refusing while stopped.
+    link.stop();
+    EXPECT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, 2));
+    link.start();
+    write(high);
+    ASSERT_TRUE(eventually([&] { return link.mRxQueue.size() == high; }));
+
+    // The receiver ends while the engine still holds the handling thread,
+    // which destroy then joins once the engine answers.
+    auto destroyed = std::async(std::launch::async, [&] { destroyLink(); });
+    EXPECT_TRUE(eventually([] { return threadsNamed("tVtspCmdRx") == 0; }));
+    hostfakes::releaseCalls();
+    EXPECT_EQ(std::future_status::ready, destroyed.wait_for(5s));
+    EXPECT_EQ(-1, link.mFd);
 }
 
 TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {

@@ -45,6 +45,11 @@ void setRecording(bool keep);
 void setResult(const std::string& function, int result);
 void clearResult(const std::string& function);
 
+// Makes every later call of `function` wait, on the caller's thread, until
+// releaseCalls() (or reset()): a media engine that stops answering.
+void holdCalls(const std::string& function);
+void releaseCalls();
+
 // Writes every recorded call as a trace line to `target`: "stderr",
 // "stdout" or a file path (appended). Null or "" switches the trace off. The
 // environment variable QUELLBORN_TRACE sets the same at start-up.
