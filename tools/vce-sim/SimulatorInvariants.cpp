@@ -82,8 +82,8 @@ std::string Simulator::checkRecords(const ScenarioStep& step) {
 }
 
 std::string Simulator::checkStreams() {
-    // The media engine's open streams are the dispatcher's streams, and the
-    // engine's loopback stream while loopback mode runs: nothing leaks.
+    // The media engine's open streams are the dispatcher's streams and the
+    // engine's loopback stream: nothing leaks.
     std::set<unsigned int> held;
     for (const android::StreamSnapshot& s : android::VtspManager::getInstance()->mCmdCallback->snapshots()) {
         if (s.mvdStreamId != 0) held.insert(s.mvdStreamId);
@@ -91,7 +91,9 @@ std::string Simulator::checkStreams() {
     const android::VideoCallEngineImpl* engine = android::VideoCallEngineImpl::getInstance();
     std::set<unsigned int> open;
     for (unsigned int id : hostfakes::openMvdStreams()) {
-        if (held.count(id) == 0 && !(engine->mLoopback && static_cast<unsigned int>(engine->mLoopbackStream) == id)) {
+        // A loopback stream stays the engine's after init(0) ends the mode,
+        // until release closes it.
+        if (held.count(id) == 0 && static_cast<unsigned int>(engine->mLoopbackStream) != id) {
             return violation("streams", "media engine stream " + std::to_string(id) +
                                                 " is open but no stream of the link or the engine holds it");
         }
