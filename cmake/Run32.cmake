@@ -31,6 +31,20 @@ else()
   if(NOT qemu_status STREQUAL "0")
     message(FATAL_ERROR "qemu-i386 cannot run a 32-bit program here (status ${qemu_status})")
   endif()
+  # qemu-i386 7.2 hands a signalled thread another thread's TLS on sigreturn
+  # (platform/emulator/signal-tls-probe.c); where it does, every program it
+  # runs preloads the repair, which the build makes first.
+  try_compile(tls_probe_built ${probe_dir}/tls ${CMAKE_SOURCE_DIR}/platform/emulator/signal-tls-probe.c
+              LINK_LIBRARIES pthread COPY_FILE ${probe_dir}/signal-tls-probe)
+  execute_process(COMMAND ${QEMU_I386} ${probe_dir}/signal-tls-probe RESULT_VARIABLE tls_status OUTPUT_QUIET)
+  if(NOT tls_status STREQUAL "0")
+    set(QUELLBORN_EMULATOR_REPAIR ${CMAKE_BINARY_DIR}/libqemu-i386-signal-tls.so)
+    add_library(qemu-i386-signal-tls MODULE ${CMAKE_SOURCE_DIR}/platform/emulator/qemu-i386-signal-tls.c)
+    set_target_properties(qemu-i386-signal-tls PROPERTIES PREFIX lib LIBRARY_OUTPUT_DIRECTORY ${CMAKE_BINARY_DIR})
+    target_link_libraries(qemu-i386-signal-tls PRIVATE ${CMAKE_DL_LIBS})
+    list(APPEND run32_env -E LD_PRELOAD=${QUELLBORN_EMULATOR_REPAIR})
+    message(STATUS "qemu-i386 replaces a signalled thread's TLS here: its programs preload ${QUELLBORN_EMULATOR_REPAIR}")
+  endif()
   set(CMAKE_CROSSCOMPILING_EMULATOR ${QEMU_I386} -E ${run32_env})
   message(STATUS "32-bit programs run through ${QEMU_I386}: this kernel cannot execute them (handsets run them natively)")
 endif()
