@@ -91,6 +91,7 @@ install_all ${missing[@]+"${missing[@]}"}
 # Kernels built without 32-bit support refuse i386 programs (Exec format
 # error); qemu-user runs them there.
 probe=$(mktemp -d)
+chmod 755 "$probe"  # apt-get download fetches as the _apt user
 trap 'rm -rf "$probe"' EXIT
 echo 'int main() { return 0; }' > "$probe/p.c"
 gcc -m32 -o "$probe/p" "$probe/p.c"
@@ -106,9 +107,17 @@ if [ ! -e "$P7ZIP_I386_DIR/usr/lib/p7zip/7z.so" ]; then
   $sudo dpkg-deb -x "$probe"/p7zip-full_*_i386.deb "$P7ZIP_I386_DIR"
 fi
 
+# A mirror whose i386 index lags can keep the 32-bit JDK out for hours;
+# after a failed try, make test32 runs do not wait for the indexes again for
+# a while (delete the stamp to try at once).
+JDK_STAMP=/var/tmp/quellborn-jdk-i386.failed
 if ! installed "$JDK_I386"; then
-  update_indexes
-  if ! install_all "$JDK_I386"; then
+  if [ -n "$(find "$JDK_STAMP" -mmin -360 2>/dev/null)" ]; then
+    echo "install-deps: $JDK_I386 could not be installed $(date -r "$JDK_STAMP" '+at %H:%M'), not tried again before 6 hours (rm $JDK_STAMP to retry); the 32-bit JVM-hosting tests will be skipped"
+  elif install_all "$JDK_I386"; then
+    $sudo rm -f "$JDK_STAMP"
+  else
+    $sudo touch "$JDK_STAMP"
     echo "install-deps: $JDK_I386 cannot be installed from these indexes; the 32-bit JVM-hosting tests will be skipped"
   fi
 fi
