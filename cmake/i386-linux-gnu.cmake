@@ -20,5 +20,10 @@ set(CMAKE_MODULE_LINKER_FLAGS_INIT "-m32 -Wl,-rpath-link,${QUELLBORN_I386_PRIVAT
 set(CMAKE_LIBRARY_ARCHITECTURE i386-linux-gnu)
 set(CMAKE_LIBRARY_PATH /usr/lib/i386-linux-gnu)
 
-# The 32-bit JDK, when the mirror could provide one.
-set(QUELLBORN_JDK_HOME /usr/lib/jvm/java-17-openjdk-i386 CACHE PATH "JDK whose javac and libjvm the host build uses")
+# The 32-bit JVM: an installed i386 JDK, else the one scripts/install-deps.sh
+# unpacks. Without either the JVM-hosting tests are skipped, saying so.
+set(jdk32 /usr/lib/jvm/java-17-openjdk-i386)
+if(NOT EXISTS ${jdk32}/lib/server/libjvm.so)
+  set(jdk32 /opt/quellborn-i386/jdk/usr/lib/jvm/java-17-openjdk-i386)
+endif()
+set(QUELLBORN_JDK_HOME ${jdk32} CACHE PATH "JDK whose javac and libjvm the host build uses")

@@ -7,7 +7,7 @@
 # --i386 adds what the 32-bit build (make test32) needs: the i386
 # architecture, the multilib compiler, the i386 AOSP and GoogleTest
 # libraries, qemu-user where this kernel cannot execute 32-bit programs, and
-# a 32-bit JDK when the mirror can provide one (the JVM-hosting tests are
+# a 32-bit JVM when the mirror can provide one (the JVM-hosting tests are
 # skipped without it; nothing else is).
 set -euo pipefail
 cd "$(dirname "$0")/.."
@@ -33,14 +33,18 @@ PACKAGES=(
 PACKAGES_I386=(
   g++-multilib
   android-libutils-dev:i386 android-liblog-dev:i386 android-libcutils-dev:i386 android-libbase-dev:i386
-  libgtest-dev:i386 libgmock-dev:i386
+  libgtest-dev:i386 libgmock-dev:i386 zlib1g:i386
 )
-JDK_I386=openjdk-17-jdk-headless:i386
 # libbacktrace (pulled in by libutils) loads 7z.so, which the i386 p7zip
 # cannot install beside the amd64 one: it is unpacked into a folder of its
-# own, which the 32-bit build links and runs against.
+# own, which the 32-bit build links and runs against. So is the 32-bit JVM:
+# installing it beside the amd64 JDK needs every library both depend on at
+# the same version on both architectures, which a lagging i386 index breaks,
+# while libjvm itself needs only libc and libstdc++.
 P7ZIP_I386=p7zip-full:i386
 P7ZIP_I386_DIR=/opt/quellborn-i386/p7zip
+JRE_I386=openjdk-17-jre-headless:i386
+JRE_I386_DIR=/opt/quellborn-i386/jdk
 
 sudo=""
 [ "$(id -u)" -ne 0 ] && sudo="sudo"
@@ -99,26 +103,24 @@ if ! "$probe/p" 2>/dev/null && ! installed qemu-user; then
   install_all qemu-user
 fi
 
-if [ ! -e "$P7ZIP_I386_DIR/usr/lib/p7zip/7z.so" ]; then
+# Unpacks an i386 package into a folder of its own.
+unpack() {
+  local package=$1 dir=$2
   update_indexes
-  echo "install-deps: unpacking $P7ZIP_I386 into $P7ZIP_I386_DIR"
-  (cd "$probe" && apt_get download -qq "$P7ZIP_I386")
-  $sudo mkdir -p "$P7ZIP_I386_DIR"
-  $sudo dpkg-deb -x "$probe"/p7zip-full_*_i386.deb "$P7ZIP_I386_DIR"
-fi
+  echo "install-deps: unpacking $package into $dir"
+  rm -f "$probe"/*.deb
+  (cd "$probe" && apt_get download -qq "$package") || return 1
+  $sudo mkdir -p "$dir"
+  $sudo dpkg-deb -x "$probe"/*.deb "$dir"
+}
 
-# A mirror whose i386 index lags can keep the 32-bit JDK out for hours;
-# after a failed try, make test32 runs do not wait for the indexes again for
-# a while (delete the stamp to try at once).
-JDK_STAMP=/var/tmp/quellborn-jdk-i386.failed
-if ! installed "$JDK_I386"; then
-  if [ -n "$(find "$JDK_STAMP" -mmin -360 2>/dev/null)" ]; then
-    echo "install-deps: $JDK_I386 could not be installed $(date -r "$JDK_STAMP" '+at %H:%M'), not tried again before 6 hours (rm $JDK_STAMP to retry); the 32-bit JVM-hosting tests will be skipped"
-  elif install_all "$JDK_I386"; then
-    $sudo rm -f "$JDK_STAMP"
-  else
-    $sudo touch "$JDK_STAMP"
-    echo "install-deps: $JDK_I386 cannot be installed from these indexes; the 32-bit JVM-hosting tests will be skipped"
+if [ ! -e "$P7ZIP_I386_DIR/usr/lib/p7zip/7z.so" ]; then
+  unpack "$P7ZIP_I386" "$P7ZIP_I386_DIR"
+fi
+if [ ! -e "$JRE_I386_DIR/usr/lib/jvm/java-17-openjdk-i386/lib/server/libjvm.so" ] &&
+   [ ! -e /usr/lib/jvm/java-17-openjdk-i386/lib/server/libjvm.so ]; then
+  if ! unpack "$JRE_I386" "$JRE_I386_DIR"; then
+    echo "install-deps: $JRE_I386 cannot be fetched from these indexes; the 32-bit JVM-hosting tests will be skipped"
   fi
 fi
 exit 0
