@@ -198,6 +198,16 @@ static_assert(offsetof(VPR_Comm, targetModule) == 3656, "targetModule offset");
 static_assert(offsetof(VPR_Comm, recordLength) == 3660, "recordLength offset");
 static_assert(kCmdBufferCapacity <= kVprCommBodySize, "every body fits the record");
 
+// Nothing in a record is wider than 32 bits, so the 32-bit device and a
+// 64-bit host align every record and view alike.
+static_assert(alignof(OSAL_NetAddress) == 4 && alignof(VtspCommand) == 4 && alignof(VprNetBind) == 4 &&
+              alignof(VPR_Comm) == 4, "records are 32-bit aligned on every ABI");
+static_assert(sizeof(VtspArgView) == 28, "VtspArgView is 28 bytes");
+static_assert(sizeof(VtspConfigView) == 12, "VtspConfigView is 12 bytes");
+static_assert(sizeof(VtspStmVideoView) == 280, "VtspStmVideoView is 280 bytes");
+static_assert(sizeof(VprTargetModule) == 4 && sizeof(VPR_CommType) == 4 && sizeof(VtspCommandCode) == 4 &&
+              sizeof(VtspStreamDir) == 4, "the enums travel as 32-bit words");
+
 // Body length of each VPR_CommType; 0 for a type the system does not know.
 constexpr uint32_t bodyLengthOf(VPR_CommType type) {
     return type == VPR_COMM_VTSP_CMD ? kVtspCommandSize

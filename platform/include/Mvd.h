@@ -79,6 +79,19 @@ typedef struct tagMVD_RTCP_STA {
 int Mvd_RtcpGetSta(unsigned int iStrmId, tagMVD_RTCP_STA* pstSta);
 
 #ifdef __cplusplus
+/* The library is built for the handset's 32-bit x86 ABI and the host's
+ * stand-in for x86-64: each record is whole 32-bit words on both, with
+ * nothing wider that one ABI would align differently from the other. */
+static_assert(sizeof(int) == 4, "the engine's words are 32-bit");
+static_assert(sizeof(tagMVD_CODEC) == 4 * MVD_CODEC_WORDS, "codec record: twenty words");
+static_assert(alignof(tagMVD_CODEC) == 4, "codec record: word-aligned");
+static_assert(sizeof(tagMVD_EVNT) == 4 * MVD_EVNT_WORDS, "event record: sixteen words");
+static_assert(alignof(tagMVD_EVNT) == 4, "event record: word-aligned");
+static_assert(sizeof(tagMVD_RTCP_STA) == 4 * MVD_RTCP_STA_WORDS, "statistics record: ten words");
+static_assert(alignof(tagMVD_RTCP_STA) == 4, "statistics record: word-aligned");
+#endif
+
+#ifdef __cplusplus
 }
 #endif
 

@@ -76,10 +76,8 @@ void ModemActor::readLoop() {
 }
 
 void ModemActor::take(const VPR_Comm& record) {
-    {
-        std::lock_guard<std::mutex> lock(mLock);
-        mRecords.push_back(record);
-    }
+    // Into the timeline first: whoever waits for the record and then reads
+    // the timeline must find it there.
     TimelineEntry entry;
     entry.kind = TimelineEntry::Kind::kRecordOut;
     entry.actor = "link";
@@ -88,6 +86,8 @@ void ModemActor::take(const VPR_Comm& record) {
     entry.mscFrom = "link";
     entry.mscTo = "modem";
     mTimeline->add(entry);
+    std::lock_guard<std::mutex> lock(mLock);
+    mRecords.push_back(record);
 }
 
 std::vector<VPR_Comm> ModemActor::recordsSince(size_t from) const {
