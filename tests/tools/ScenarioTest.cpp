@@ -39,27 +39,22 @@ TEST(ScenarioParse, EachActorsStepsKeepTheirArguments) {
                               "expect event 11 480 640 0\n"
                               "expect call Mvd_Open(\"10.0.0.1\", 6000\n"
                               "expect bind stream=2 local=[::1]:6000\n");
-    const std::vector<ScenarioStep>& steps = s.steps();
-    ASSERT_EQ(11u, steps.size());
-    EXPECT_EQ(Actor::kHeading, steps[0].actor);
-    EXPECT_EQ("set-up", steps[0].text);
-    EXPECT_EQ(Actor::kClient, steps[1].actor);
-    EXPECT_EQ((std::vector<int32_t>{90, 0, 1}), steps[1].ints);
-    EXPECT_EQ("client orientation 90 0 1", steps[1].source);
-    EXPECT_EQ(2, steps[1].line);
-    EXPECT_EQ((std::vector<int32_t>{1}), steps[2].ints);
-    EXPECT_EQ((std::vector<int32_t>{1}), steps[3].ints);
-    EXPECT_EQ("/data/a b.png", steps[4].text);
-    EXPECT_EQ(Actor::kModem, steps[5].actor);
-    EXPECT_EQ(2u, steps[5].modem.stream.streamId);
-    EXPECT_EQ(Actor::kMedia, steps[6].actor);
-    EXPECT_EQ((std::vector<int32_t>{27}), steps[6].ints);
-    EXPECT_EQ("{\"Render\":\"Remote\"}", steps[6].text);
-    EXPECT_EQ(Actor::kWait, steps[7].actor);
-    EXPECT_EQ((std::vector<int32_t>{11, 480, 640, 0}), steps[8].ints);
-    EXPECT_EQ("Mvd_Open(\"10.0.0.1\", 6000", steps[9].text);
-    EXPECT_TRUE(steps[10].hasLocal);
-    EXPECT_EQ(2u, steps[10].modem.stream.localAddr.type);
+    std::vector<std::string> shown;  // "actor line verb ints [text]" per step
+    for (const ScenarioStep& step : s.steps()) {
+        shown.push_back(std::to_string(static_cast<int>(step.actor)) + " " + std::to_string(step.line) + " " + step.verb);
+        for (int32_t v : step.ints) shown.back() += " " + std::to_string(v);
+        shown.back() += " [" + step.text + "]";
+    }
+    EXPECT_EQ((std::vector<std::string>{"0 1  [set-up]", "1 2 orientation 90 0 1 []", "1 3 surface 1 [local]",
+                                        "1 4 init 1 []", "1 5 hide [/data/a b.png]", "2 6 modem []",
+                                        "3 7 zmf 27 [{\"Render\":\"Remote\"}]", "4 8 wait 20 []",
+                                        "5 9 event 11 480 640 0 []", "5 10 call [Mvd_Open(\"10.0.0.1\", 6000]",
+                                        "5 11 bind []"}),
+              shown);
+    EXPECT_EQ("client orientation 90 0 1", s.steps()[1].source);
+    EXPECT_EQ(2u, s.steps()[5].modem.stream.streamId);
+    EXPECT_TRUE(s.steps()[10].hasLocal);
+    EXPECT_EQ(2u, s.steps()[10].modem.stream.localAddr.type);
 }
 
 TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
