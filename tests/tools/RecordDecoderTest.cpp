@@ -9,6 +9,8 @@
 
 #include "RecordDecoder.h"
 #include "StepSyntax.h"
+#include "VtspRecord.h"
+#include "WireBytes.h"
 
 using android::VPR_Comm;
 
@@ -21,17 +23,21 @@ VPR_Comm recordOf(const std::string& step) {
     return parsed.record();
 }
 
-// A bind request as the link writes it: address in wire order.
+// A bind request as the link writes it, byte by byte: ports and IPv6 groups big-endian.
 VPR_Comm bindRecord(int32_t stream, const std::string& endpoint) {
+    using namespace vtspwire;
+    android::OSAL_NetAddress addr{};
+    EXPECT_TRUE(vtspcodec::parseEndpoint(endpoint, &addr));
     VPR_Comm record{};
-    android::VprNetBind bind{};
-    bind.code = android::VPR_NET_CMD_BIND;
-    bind.streamId = stream;
-    EXPECT_TRUE(vtspcodec::parseEndpoint(endpoint, &bind.addr));
-    android::swapAddress(bind.addr);
-    memcpy(record.body, &bind, sizeof(bind));
-    record.targetModule = android::VPMD_NET_TARGET;
-    record.recordLength = android::kVprCommSize;
+    uint8_t* b = reinterpret_cast<uint8_t*>(&record);
+    putLe32(b, kBindCode, android::VPR_NET_CMD_BIND);
+    putLe32(b, kBindStreamId, static_cast<uint32_t>(stream));
+    memcpy(b + kBindAddr + kAddrIpv4, addr.ipv4, sizeof(addr.ipv4));
+    for (size_t i = 0; i < 8; ++i) putBe16(b, kBindAddr + kAddrIpv6 + 2 * i, addr.ipv6[i]);
+    putBe16(b, kBindAddr + kAddrPort, addr.port);
+    putLe32(b, kBindAddr + kAddrType, addr.type);
+    putLe32(b, kTargetOffset, android::VPMD_NET_TARGET);
+    putLe32(b, kLengthOffset, kRecordSize);
     return record;
 }
 
