@@ -3,7 +3,6 @@
 // by the vce-sim CTest entries; the modem steps' own syntax by StepSyntaxTest.
 #include <gtest/gtest.h>
 
-#include <random>
 
 #include "Scenario.h"
 
@@ -76,24 +75,4 @@ TEST(ScenarioParse, ErrorsNameTheLineAndWhatWasExpected) {
             {"camera 1", "line 1: expected client, modem, media, wait, expect or a ## heading but found 'camera'"},
     };
     for (const auto& c : cases) EXPECT_EQ(c.second, errorOf(c.first)) << c.first;
-}
-
-TEST(ScenarioParse, RandomTextIsRefusedOrReadNeverACrash) {
-    std::mt19937 random(7);
-    const char* words[] = {"client", "modem", "media", "expect", "wait", "camera", "start", "stream=1", "event", "call",
-                           "bind", "zmf", "1", "-5", "0x", "#", "##", "\n", " ", "local=", "[::1]:1", "surface"};
-    for (int i = 0; i < 5000; ++i) {
-        std::string text;
-        const size_t count = random() % 40;
-        for (size_t j = 0; j < count; ++j) {
-            text += random() % 5 == 0 ? std::string(1, static_cast<char>(random() % 256))
-                                      : std::string(words[random() % (sizeof(words) / sizeof(words[0]))]) + " ";
-        }
-        Scenario scenario;
-        std::string error;
-        if (!Scenario::parse(text, &scenario, &error)) {
-            EXPECT_EQ(0u, error.find("line ")) << error;
-            EXPECT_NE(std::string::npos, error.find(": expected ")) << error;
-        }
-    }
 }
