@@ -206,13 +206,8 @@ V upcalls() {
 }
 
 ::testing::Matcher<std::string> onAttachedThread(const std::string& call) {
-    std::string escaped;
-    for (char c : call) {
-        if (std::strchr("()[]{}.*+?^$|\\", c) != nullptr) escaped += '\\';
-        escaped += c;
-    }
     return ::testing::AllOf(
-            ::testing::MatchesRegex(escaped + " on Thread-[0-9]+"),
+            ::testing::StartsWith(call + " on Thread-"),
             ::testing::ResultOf([](const std::string& s) { return javaThreadAlive(threadOf(s)); }, false));
 }
 

@@ -3,6 +3,7 @@
 // version, log level, statistics and provisioning, and how Java strings
 // reach the engine.
 #include "JvmHarness.h"
+#include "MmeJni.h"
 
 using namespace jvmtest;
 using ::testing::Contains;
@@ -59,6 +60,15 @@ TEST_F(MmeSystemTest, SysInitStartsTheEngineInOrderOrRollsItAllBack) {
     // The engine's own text goes to the platform log under its tag.
     ASSERT_TRUE(hostfakes::zosPrint("engine says hello"));
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "MME", "engine says hello"));
+}
+
+TEST_F(MmeSystemTest, AnUpcallMissingFromTheClassIsOnlyDisabled) {
+    // A class without any of the upcall methods: the engine still starts,
+    // no error reaches the application, and the upcalls answer 0.
+    EXPECT_EQ(0, android::sysInit(env(), Local<jclass>(findClass("android/content/Context"))));
+    EXPECT_FALSE(env()->ExceptionCheck());
+    EXPECT_EQ(0, hostfakes::fireZpandTimerInit());
+    EXPECT_TRUE(upcalls().empty());
 }
 
 TEST_F(MmeSystemTest, SysDestroyStopsTheEngineAndKeepsTheBridge) {

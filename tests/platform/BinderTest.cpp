@@ -1,9 +1,10 @@
-// Local binders in one process: BBinder's defaults, the dispatch of transact
-// to onTransact, the dump transaction and the caller's identity, attached
-// objects, and IInterface::asBinder.
+// Where the system meets the binder stand-in, it must answer as a device
+// does: a local binder's transact, its refusal of death links, the dump
+// transaction with the caller's identity, and the service manager's
+// replacement of a name.
 #include <binder/Binder.h>
-#include <binder/IInterface.h>
 #include <binder/IPCThreadState.h>
+#include <binder/IServiceManager.h>
 #include <binder/Parcel.h>
 #include <binder/PermissionCache.h>
 #include <gtest/gtest.h>
@@ -23,14 +24,10 @@ class EchoBinder : public BBinder {
 public:
     static constexpr uint32_t kEcho = IBinder::FIRST_CALL_TRANSACTION;
 
-    size_t positionSeen = SIZE_MAX;
-
 protected:
     status_t onTransact(uint32_t code, const Parcel& data, Parcel* reply, uint32_t flags) override {
         if (code != kEcho) return BBinder::onTransact(code, data, reply, flags);
-        positionSeen = data.dataPosition();
-        reply->writeInt32(data.readInt32() + 1);
-        return NO_ERROR;
+        return reply->writeInt32(data.readInt32() + 1);
     }
 };
 
@@ -58,46 +55,22 @@ class NoDeath : public IBinder::DeathRecipient {
 
 }  // namespace
 
-TEST(BBinder, DefaultsOfALocalBinder) {
-    sp<BBinder> binder = new BBinder();
-    EXPECT_EQ(0u, binder->getInterfaceDescriptor().size());
-    EXPECT_TRUE(binder->isBinderAlive());
-    EXPECT_EQ(NO_ERROR, binder->pingBinder());
-    EXPECT_EQ(binder.get(), binder->localBinder());
-    EXPECT_EQ(nullptr, binder->remoteBinder());
-    EXPECT_EQ(nullptr, binder->queryLocalInterface(String16("android.test.IFoo")));
-    EXPECT_FALSE(binder->checkSubclass(nullptr));
-
-    // A local binder cannot die on its own: linking is refused as on a device.
-    sp<IBinder::DeathRecipient> recipient = new NoDeath();
-    EXPECT_EQ(INVALID_OPERATION, binder->linkToDeath(recipient));
-    EXPECT_EQ(INVALID_OPERATION, binder->unlinkToDeath(recipient));
-}
-
-TEST(BBinder, TransactDispatchesFromTheStartOfBothParcelsPingsAndDescribes) {
+TEST(BBinder, TransactReadsFromTheStartAndLeavesUnknownCodesUnanswered) {
     sp<EchoBinder> binder = new EchoBinder();
-    Parcel data;
+    Parcel data, echoed, reply;
     data.writeInt32(41);  // leaves the position at 4
-    Parcel echoed;
     EXPECT_EQ(NO_ERROR, binder->transact(EchoBinder::kEcho, data, &echoed));
-    EXPECT_EQ(0u, binder->positionSeen);
-    EXPECT_EQ(0u, echoed.dataPosition());
     EXPECT_EQ(42, echoed.readInt32());
-
-    Parcel reply;
-    EXPECT_EQ(NO_ERROR, binder->transact(IBinder::PING_TRANSACTION, data, &reply));
-    EXPECT_EQ(0u, reply.dataSize());
+    EXPECT_EQ(NO_ERROR, binder->pingBinder());
     EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, &reply));
     EXPECT_EQ(String16(), reply.readString16());
-    // Codes no one knows reach the default handling and leave the reply empty.
     for (uint32_t code : {0u, EchoBinder::kEcho + 1, 0xffffffffu}) {
         Parcel r;
         EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(code, data, &r)) << code;
         EXPECT_EQ(0u, r.dataSize()) << code;
     }
-    // One-way calls have no reply parcel.
-    EXPECT_EQ(UNKNOWN_TRANSACTION, binder->transact(7, data, nullptr, IBinder::FLAG_ONEWAY));
-    EXPECT_EQ(NO_ERROR, binder->transact(IBinder::INTERFACE_TRANSACTION, data, nullptr));
+    // A local binder cannot die on its own: linking is refused.
+    EXPECT_EQ(INVALID_OPERATION, binder->linkToDeath(new NoDeath()));
 }
 
 // The permission controller's answers and the caller's identity come from
@@ -120,31 +93,18 @@ TEST(BBinder, DumpTransactionReachesDumpWithTheCallersIdentity) {
     EXPECT_EQ("0: ", dumpOf(new BBinder(), {"-a"}));
 }
 
-TEST(BBinder, AttachedObjectsAreFoundDetachedAndCleanedUpWithTheBinder) {
-    static int idA;
-    static int idB;
-    int objectA = 1;
-    int objectB = 2;
-    std::vector<const void*> cleaned;
-    auto cleanup = [](const void* id, void*, void* cookie) {
-        static_cast<std::vector<const void*>*>(cookie)->push_back(id);
-    };
-    {
-        sp<BBinder> binder = new BBinder();
-        EXPECT_EQ(nullptr, binder->findObject(&idA));
-        binder->attachObject(&idA, &objectA, &cleaned, cleanup);
-        binder->attachObject(&idB, &objectB, &cleaned, cleanup);
-        binder->attachObject(&idA, &objectB, &cleaned, cleanup);  // the first attach stays
-        EXPECT_EQ(&objectA, binder->findObject(&idA));
-        EXPECT_EQ(&objectB, binder->findObject(&idB));
-        binder->detachObject(&idB);
-        EXPECT_EQ(nullptr, binder->findObject(&idB));
-        EXPECT_TRUE(cleaned.empty());  // detaching does not clean up
-    }
-    EXPECT_EQ(std::vector<const void*>{&idA}, cleaned);
-}
-
-TEST(IInterface, AsBinderOfNullIsNull) {
-    EXPECT_EQ(nullptr, IInterface::asBinder(static_cast<const IInterface*>(nullptr)));
-    EXPECT_EQ(nullptr, IInterface::asBinder(sp<IInterface>()));
+TEST(ServiceManager, AddingANameAgainReplacesAndReleasesTheFirstService) {
+    sp<IServiceManager> sm = defaultServiceManager();
+    const String16 name("sm.test.replace");
+    EXPECT_EQ(nullptr, sm->checkService(name));
+    sp<IBinder> first = new BBinder();
+    const wp<IBinder> weakFirst = first;
+    ASSERT_EQ(NO_ERROR, sm->addService(name, first));
+    first.clear();
+    EXPECT_NE(nullptr, weakFirst.promote());  // the manager keeps it alive...
+    sp<IBinder> second = new BBinder();
+    ASSERT_EQ(NO_ERROR, sm->addService(name, second));
+    EXPECT_EQ(nullptr, weakFirst.promote());  // ...until it is replaced
+    EXPECT_EQ(second, sm->checkService(name));
+    EXPECT_EQ(BAD_VALUE, sm->addService(String16("sm.test.null"), nullptr));
 }

@@ -9,6 +9,8 @@
 
 #include "RecordDecoder.h"
 #include "StepSyntax.h"
+#include "VtspRecord.h"
+#include "WireBytes.h"
 
 using android::VPR_Comm;
 
@@ -21,17 +23,21 @@ VPR_Comm recordOf(const std::string& step) {
     return parsed.record();
 }
 
-// A bind request as the link writes it: address in wire order.
+// A bind request as the link writes it, byte by byte: ports and IPv6 groups big-endian.
 VPR_Comm bindRecord(int32_t stream, const std::string& endpoint) {
+    using namespace vtspwire;
+    android::OSAL_NetAddress addr{};
+    EXPECT_TRUE(vtspcodec::parseEndpoint(endpoint, &addr));
     VPR_Comm record{};
-    android::VprNetBind bind{};
-    bind.code = android::VPR_NET_CMD_BIND;
-    bind.streamId = stream;
-    EXPECT_TRUE(vtspcodec::parseEndpoint(endpoint, &bind.addr));
-    android::swapAddress(bind.addr);
-    memcpy(record.body, &bind, sizeof(bind));
-    record.targetModule = android::VPMD_NET_TARGET;
-    record.recordLength = android::kVprCommSize;
+    uint8_t* b = reinterpret_cast<uint8_t*>(&record);
+    putLe32(b, kBindCode, android::VPR_NET_CMD_BIND);
+    putLe32(b, kBindStreamId, static_cast<uint32_t>(stream));
+    memcpy(b + kBindAddr + kAddrIpv4, addr.ipv4, sizeof(addr.ipv4));
+    for (size_t i = 0; i < 8; ++i) putBe16(b, kBindAddr + kAddrIpv6 + 2 * i, addr.ipv6[i]);
+    putBe16(b, kBindAddr + kAddrPort, addr.port);
+    putLe32(b, kBindAddr + kAddrType, addr.type);
+    putLe32(b, kTargetOffset, android::VPMD_NET_TARGET);
+    putLe32(b, kLengthOffset, kRecordSize);
     return record;
 }
 
@@ -57,37 +63,31 @@ TEST(RecordDecoderSummary, OneLinePerTargetModule) {
     EXPECT_EQ("END stream 3 [type 2: dropped]", RecordDecoder::summary(recordOf("end stream=3 type=2")));
 }
 
-TEST(RecordDecoderDescribe, FieldsInHostOrderWithTheStepThatBuildsThem) {
-    const std::string text = described(recordOf(
+TEST(RecordDecoderDescribe, FieldsInHostOrderAndUnknownThingsNamedWithAnExcerpt) {
+    const std::string start = described(recordOf(
             "start stream=1 local=10.0.0.1:6000 remote=[2001:db8::2]:5000 pt=96,97 bw=500 rbw=400 ext=3 rtcp-ports=6001:5001"));
-    EXPECT_NE(std::string::npos, text.find("record 3  type 0  targetModule 0 (video command)  recordLength 3664\n"));
-    EXPECT_NE(std::string::npos, text.find("  START (code 81)  infc 0\n"));
-    EXPECT_NE(std::string::npos, text.find("  stream 1  dir 4 sendrecv  encoder 0\n"));
-    EXPECT_NE(std::string::npos, text.find("  payload types 96, 97\n"));
-    EXPECT_NE(std::string::npos, text.find("  local  10.0.0.1:6000  rtcp 6001  type 0 (IPv4)\n"));
-    EXPECT_NE(std::string::npos, text.find("  remote [2001:db8::2]:5000  rtcp 5001  type 2 (IPv6)\n"));
-    EXPECT_NE(std::string::npos, text.find("  bandwidth local 500 kbps, remote 400 kbps\n"));
-    EXPECT_NE(std::string::npos, text.find("  extension 0  extmap id 3 uri \"urn:3gpp:video-orientation\"\n"));
-    EXPECT_NE(std::string::npos, text.find("  step: start stream=1 dir=sendrecv local=10.0.0.1:6000 "
-                                           "remote=[2001:db8::2]:5000 pt=96,97 bw=500 rbw=400 ext=3 rtcp-ports=6001:5001\n"));
-
-    EXPECT_NE(std::string::npos, described(bindRecord(4, "[fe80::9]:7000"))
-                                         .find("  BIND (code 7)  stream 4  address [fe80::9]:7000  type 2 (IPv6)\n"));
-    EXPECT_NE(std::string::npos, described(recordOf("config stream=2 rtcp=0x91 on=0"))
-                                         .find("  template 23 (RTCP feedback)  on 0  stream 2  mask 0x91 (NACK TMMBR "
-                                               "+ignored)\n"));
-}
-
-TEST(RecordDecoderDescribe, UnknownThingsAreNamedWithAnExcerpt) {
-    EXPECT_NE(std::string::npos, described(recordOf("raw target=0 code=42"))
-                                         .find("  unknown command (code 42)  infc 0\n  body: 2a 00 00 00"));
-    EXPECT_NE(std::string::npos, described(recordOf("raw target=9 code=1"))
-                                         .find("unknown target module: the link drops it; body: 01 00 00 00"));
-    EXPECT_NE(std::string::npos, described(recordOf("start stream=1 type=5"))
-                                         .find("type 5: the link drops video commands whose type is not 0"));
     VPR_Comm shifted = recordOf("end stream=1");
     shifted.recordLength = 0x500e0000;
-    EXPECT_NE(std::string::npos, described(shifted).find("(not 3664: if the trailer looks like body bytes"));
+    const std::pair<std::string, std::string> rows[] = {
+            {start, "record 3  type 0  targetModule 0 (video command)  recordLength 3664\n"},
+            {start, "  START (code 81)  infc 0\n"},
+            {start, "  stream 1  dir 4 sendrecv  encoder 0\n"},
+            {start, "  payload types 96, 97\n"},
+            {start, "  local  10.0.0.1:6000  rtcp 6001  type 0 (IPv4)\n"},
+            {start, "  remote [2001:db8::2]:5000  rtcp 5001  type 2 (IPv6)\n"},
+            {start, "  bandwidth local 500 kbps, remote 400 kbps\n"},
+            {start, "  extension 0  extmap id 3 uri \"urn:3gpp:video-orientation\"\n"},
+            {start, "  step: start stream=1 dir=sendrecv local=10.0.0.1:6000 remote=[2001:db8::2]:5000 pt=96,97 bw=500 "
+                    "rbw=400 ext=3 rtcp-ports=6001:5001\n"},
+            {described(bindRecord(4, "[fe80::9]:7000")), "  BIND (code 7)  stream 4  address [fe80::9]:7000  type 2 (IPv6)\n"},
+            {described(recordOf("config stream=2 rtcp=0x91 on=0")),
+             "  template 23 (RTCP feedback)  on 0  stream 2  mask 0x91 (NACK TMMBR +ignored)\n"},
+            {described(recordOf("raw target=0 code=42")), "  unknown command (code 42)  infc 0\n  body: 2a 00 00 00"},
+            {described(recordOf("raw target=9 code=1")), "unknown target module: the link drops it; body: 01 00 00 00"},
+            {described(recordOf("start stream=1 type=5")), "type 5: the link drops video commands whose type is not 0"},
+            {described(shifted), "(not 3664: if the trailer looks like body bytes"},
+    };
+    for (const auto& [text, part] : rows) EXPECT_NE(std::string::npos, text.find(part)) << part;
 }
 
 TEST(RecordDecoderStream, TrailingBytesAreExplainedAndShown) {

