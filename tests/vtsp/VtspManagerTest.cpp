@@ -1,10 +1,14 @@
 // The modem command link run on a raw pseudo-terminal with its real threads:
 // record assembly and routing, a whole call from the modem's side, pausing,
-// shutdown in every state, a flood held back at the pipe, an unusable device
-// and garbage on the pipe.
+// shutdown in every state, a flood held back at the pipe, an unusable device,
+// garbage on the pipe, SIGUSR1 storms and a device that refuses reads or
+// writes for a while. Every record accepted while the link runs is handled
+// exactly once and every reply is written whole.
 #include <android/log.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <poll.h>
+#include <pthread.h>
 #include <signal.h>
 #include <sys/types.h>
 #include <unistd.h>
@@ -16,6 +20,7 @@
 #include <fstream>
 #include <future>
 #include <random>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -160,6 +165,30 @@ protected:
                std::to_string(b.streamId) + " at " + endpointText(b.addr);
     }
 
+    // Reads `n` replies, each a whole bind request; answers the streams they name.
+    std::multiset<int32_t> readBinds(size_t n) {
+        std::multiset<int32_t> ids;
+        for (size_t i = 0; i < n; ++i) {
+            const std::string b = readBind();
+            if (b.rfind(kWholeBind + "stream ", 0) != 0) {
+                ADD_FAILURE() << "reply " << i << " of " << n << ": " << b;
+                break;
+            }
+            ids.insert(std::stoi(b.substr(kWholeBind.size() + 7)));
+        }
+        return ids;
+    }
+    static std::multiset<int32_t> range(int32_t first, int32_t last) {
+        std::multiset<int32_t> ids;
+        for (int32_t id = first; id <= last; ++id) ids.insert(id);
+        return ids;
+    }
+    size_t recvLines() const {
+        size_t n = 0;
+        for (const LogLine& l : log.linesWithTag(kTag)) n += l.text.rfind("cmdRxFunc, recv msg ", 0) == 0;
+        return n;
+    }
+
     // Starts the link with the media engine not answering: the handling
     // thread takes a first start and waits in the engine, so every later
     // command stays queued.
@@ -190,9 +219,9 @@ protected:
 
 TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     startLink();
-    // The start arrives in short writes and is still routed once.
+    // The start arrives one byte a write and is still routed once.
     StreamCommand start = startCommand(7);
-    pty.writeRecord(streamRecord(start), 100, 1ms);
+    pty.writeRecord(streamRecord(start), 1);
     // The reply goes out in wire order (read back here in host order); how
     // a body is turned and composed is CmdBufferTest's business.
     EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
@@ -242,22 +271,6 @@ TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
     for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
     EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
     EXPECT_EQ("Mvd_Open(\"10.0.0.9\", 6010, out=1) = 0", hostfakes::callTexts().at(0));
-}
-
-TEST_F(VtspManagerTest, StoppedLinkDropsCommandsUntilStartedAgain) {
-    startLink();
-    link.stop();
-    pty.writeRecord(streamRecord(startCommand(7)));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)));
-
-    link.start();
-    pty.writeRecord(streamRecord(startCommand(8, "10.0.0.8", 6008)));
-    EXPECT_EQ(kWholeBind + "stream 8 at 10.0.0.8:6008", readBind());
-    // The refused command never reached the media engine, before or after.
-    EXPECT_EQ("Mvd_Open(\"10.0.0.8\", 6008, out=1) = 0", hostfakes::callTexts().at(0));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_EQ(1u, link.mCmdCallback->streamCount());
 }
 
 TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
@@ -523,4 +536,168 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
     }
     EXPECT_EQ(expected, bind);
     EXPECT_TRUE(link.mCmdCallback->snapshot(4242));
+}
+
+TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
+    startLink();
+    const pthread_t targets[] = {link.mRxThread, link.mTxThread, link.mHandleThread};
+    std::atomic<bool> storming{true};
+    std::atomic<int> sent{0};
+    std::thread storm([&] {
+        while (storming) {
+            for (pthread_t t : targets) pthread_kill(t, SIGUSR1);
+            ++sent;
+            std::this_thread::sleep_for(1ms);
+        }
+    });
+    constexpr int kRecords = 30;
+    const auto stormBegan = Clock::now();
+    while (sent < 20 && msSince(stormBegan) < 5000) std::this_thread::sleep_for(1ms);
+    // Short writes with pauses so the receiver is interrupted in the middle of records too.
+    for (int id = 1; id <= kRecords; ++id) pty.writeRecord(streamRecord(startCommand(id)), 1000, 1ms);
+    const std::multiset<int32_t> ids = readBinds(kRecords);
+    storming = false;
+    storm.join();
+    EXPECT_GT(sent.load(), 50);
+    EXPECT_EQ(range(1, kRecords), ids);
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(static_cast<size_t>(kRecords), recvLines());
+    EXPECT_EQ(static_cast<size_t>(kRecords), hostfakes::callCount("Mvd_Open"));
+    EXPECT_EQ(static_cast<size_t>(kRecords), link.mCmdCallback->streamCount());
+}
+
+// The link's descriptor is swapped for a read-only one on the same device:
+// reads still work, every write fails.
+TEST_F(VtspManagerTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
+    startLink();
+    const int readOnly = open(pty.devicePath(), O_RDONLY | O_NOCTTY);
+    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
+    ASSERT_GE(readOnly, 0);
+    ASSERT_GE(readWrite, 0);
+    ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
+    const std::string failed = "Failed to write data to " + std::string(pty.devicePath()) +
+                               ", err: Bad file descriptor";
+
+    pty.writeRecord(streamRecord(startCommand(5)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
+
+    // The device works again: the pending reply goes out whole, once.
+    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
+    EXPECT_EQ(range(5, 5), readBinds(1));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
+
+    // Failing again, destroy still returns promptly.
+    ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
+    pty.writeRecord(streamRecord(startCommand(6)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 4, 8s));
+    const auto before = Clock::now();
+    destroyLink();
+    EXPECT_LT(msSince(before), 1800);  // shorter than the 2 s retry pause
+    EXPECT_EQ(-1, link.mFd);
+    close(readOnly);
+    close(readWrite);
+}
+
+TEST_F(VtspManagerTest, FailedReadIsRetriedAfterAPauseAndResumes) {
+    startLink();
+    const int writeOnly = open(pty.devicePath(), O_WRONLY | O_NOCTTY);
+    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
+    ASSERT_GE(writeOnly, 0);
+    ASSERT_GE(readWrite, 0);
+    pty.writeRecord(streamRecord(startCommand(10)));
+    EXPECT_EQ(range(10, 10), readBinds(1));
+    ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
+    const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
+
+    // The receive thread may already sit in a read that keeps the old
+    // descriptor, which record 11 then completes; either way the reads after
+    // that fail, and record 11 is read once, before or after the repair.
+    pty.writeRecord(streamRecord(startCommand(11)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
+
+    // The device works again: the next record is read whole and handled once.
+    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
+    pty.writeRecord(streamRecord(startCommand(12)));
+    EXPECT_EQ(range(11, 12), readBinds(2));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(3u, hostfakes::callCount("Mvd_Open"));
+    EXPECT_EQ(3u, recvLines());
+    close(writeOnly);
+    close(readWrite);
+}
+
+TEST_F(VtspManagerTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
+    startLink();
+    constexpr int kPerPhase = 5;
+    size_t refused = 0;
+    for (int cycle = 0; cycle < 3; ++cycle) {
+        SCOPED_TRACE(cycle);
+        const int running = 100 * cycle + 1, stopped = 100 * cycle + 50;
+        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(running + i)));
+        EXPECT_EQ(range(running, running + kPerPhase - 1), readBinds(kPerPhase));
+        link.stop();
+        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(stopped + i)));
+        refused += kPerPhase;
+        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, refused));
+        link.start();
+    }
+    const int last = 1000;
+    pty.writeRecord(streamRecord(startCommand(last)));
+    EXPECT_EQ(range(last, last), readBinds(1));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(refused, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
+    EXPECT_EQ(2 * refused + 1, recvLines());
+    EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
+    for (int cycle = 0; cycle < 3; ++cycle) {
+        for (int i = 0; i < kPerPhase; ++i) {
+            EXPECT_TRUE(link.mCmdCallback->snapshot(100 * cycle + 1 + i));
+            EXPECT_FALSE(link.mCmdCallback->snapshot(100 * cycle + 50 + i));
+        }
+    }
+}
+
+TEST_F(VtspManagerTest, DestroyUnderLoadReturnsAndClosesTheDevice) {
+    startLink();
+    std::atomic<bool> loading{true};
+    std::atomic<int> written{0};
+    // Starts and ends of one stream, written and answered without pause; the
+    // modem side never blocks so it can always be told to stop.
+    std::thread modem([&] {
+        const int fd = pty.masterFd();
+        std::vector<unsigned char> out, in(4096);
+        size_t offset = 0;
+        int n = 0;
+        while (loading) {
+            if (offset == out.size()) {
+                StreamCommand c = startCommand(3);
+                if (n++ % 2) c.code = _VTSP_CMD_STREAM_VIDEO_END;
+                const VPR_Comm record = streamRecord(c);
+                const auto* bytes = reinterpret_cast<const unsigned char*>(&record);
+                out.assign(bytes, bytes + sizeof(record));
+                offset = 0;
+            }
+            pollfd p{fd, POLLIN | POLLOUT, 0};
+            if (poll(&p, 1, 10) <= 0) continue;
+            if (p.revents & POLLIN) (void)!read(fd, in.data(), in.size());
+            if (p.revents & POLLOUT) {
+                const int flags = fcntl(fd, F_GETFL);
+                fcntl(fd, F_SETFL, flags | O_NONBLOCK);
+                const ssize_t w = write(fd, out.data() + offset, out.size() - offset);
+                fcntl(fd, F_SETFL, flags);
+                if (w > 0) offset += static_cast<size_t>(w);
+                if (offset == out.size()) ++written;
+            }
+        }
+    });
+    EXPECT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, "cmdRxFunc, recv msg 50, targetModule 0"));
+    const auto before = Clock::now();
+    destroyLink();
+    EXPECT_LT(msSince(before), 3000);
+    EXPECT_EQ(-1, link.mFd);
+    loading = false;
+    modem.join();
+    EXPECT_GE(written.load(), 50);
 }
