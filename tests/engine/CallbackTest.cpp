@@ -227,29 +227,3 @@ TEST_F(CallbackTest, ACallbackChangeWaitsForTheNotificationInProgress) {
               order);
     EXPECT_EQ(Strings{}, received(*second));
 }
-
-TEST_F(CallbackTest, NotificationsRaceCallbackChangesSafely) {
-    sp<RemoteBinder> first = enginetest::remoteCallback();
-    sp<RemoteBinder> second = enginetest::remoteCallback();
-    constexpr int kRounds = 100;
-    std::thread events([] {
-        for (int i = 0; i < kRounds; ++i) {
-            mmeEvent(i % 2 == 0 ? kRtpBreak : kRtpReceived);
-            remoteVideoSize();
-        }
-    });
-    for (int i = 0; i < kRounds / 2; ++i) {
-        setCallback(i % 2 == 0 ? first : second);
-        cleanCallback();
-    }
-    events.join();
-
-    // Whatever interleaving happened, every delivery was whole.
-    for (const sp<RemoteBinder>& client : {first, second}) {
-        for (const RemoteBinder::Transaction& t : client->transactions()) {
-            EXPECT_EQ(t.code == 0 ? 4u : 16u, t.data.size());
-            EXPECT_EQ(0u, t.flags);
-        }
-        EXPECT_EQ(0u, client->deathRecipientCount());
-    }
-}

@@ -85,12 +85,6 @@ TEST_F(CameraTest, UplinkRateChoosesTheSizeOfTheNextOpen) {
     EXPECT_EQ(0, setCamera(0));
     EXPECT_TRUE(callsOf([&] { send(kUplinkQos, {900}); }).empty());
     EXPECT_EQ(1, streamConfig());
-
-    // The building block only answers; the callers store its choice.
-    send(kEngineInit, {0});
-    send(kUplinkQos, {479});
-    EXPECT_EQ(3, engine()->getCameraSizeFromQos());
-    EXPECT_EQ(-1, engine()->mCameraSize);
 }
 
 TEST_F(CameraTest, PreviewSizeIsFoldedToPortraitAndStoredWhileClosed) {
@@ -127,33 +121,6 @@ TEST_F(CameraTest, SizeChangeResizesTheOpenCapture) {
     EXPECT_TRUE(callsOf([&] { setSize(9); }).empty());
     EXPECT_EQ((Strings{"camdrvResize(256, 480, 640, 30) = 0"}), callsOf([&] { setSize(2); }));
     EXPECT_EQ(2, streamConfig());
-}
-
-TEST_F(CameraTest, RestartCaptureBuildingBlock) {
-    // No capture and no camera id: the size is only stored.
-    EXPECT_EQ(0, engine()->restartCapture(0, 3));
-    EXPECT_TRUE(newCalls().empty());
-    EXPECT_EQ(0, engine()->restartCapture(0, 3));
-    EXPECT_EQ((Strings{"restartCapture, new_size:3", "restartCapture, new_size:3",
-                       "restartCapture, should never be here"}),
-              engineLines());
-    EXPECT_EQ(0, setCamera(0));
-    EXPECT_EQ(openText(0, kFirstHandle, 240, 320, 15), newCalls().at(0));
-    EXPECT_EQ(0, setCamera(-1));
-
-    // A capture started without a handle kept for it is started anew.
-    markCalls();
-    const long first = engine()->startCapture(1);
-    EXPECT_EQ(kFirstHandle + 1, first);
-    EXPECT_EQ(0, engine()->mCaptureHandle);
-    EXPECT_EQ(0, engine()->restartCapture(0, 1));
-    EXPECT_TRUE(logged("restartCapture, try start capture"));
-    EXPECT_EQ(kFirstHandle + 2, engine()->mCaptureHandle);
-    EXPECT_EQ(openText(1, kFirstHandle + 2, 480, 640, 15), newCallsOf("camdrvOpen").at(1));
-    EXPECT_EQ(0, setCamera(-1));
-    EXPECT_TRUE(called("camdrvStop(258) = 0"));
-    EXPECT_EQ(0, engine()->stopCapture(first));
-    EXPECT_TRUE(called("camdrvStop(257) = 0"));
 }
 
 TEST_F(CameraTest, FailedOpenAnswersMinusOneAndLeavesTheCameraClosed) {

@@ -63,42 +63,9 @@ inline bool contains(const std::vector<std::string>& all, const std::string& one
     return std::find(all.begin(), all.end(), one) != all.end();
 }
 
-// Each text appears in `all`, after the one before it.
-inline ::testing::AssertionResult inOrder(const std::vector<std::string>& all,
-                                          std::initializer_list<std::string> texts) {
-    auto from = all.begin();
-    for (const std::string& text : texts) {
-        const auto it = std::find(from, all.end(), text);
-        if (it == all.end()) {
-            ::testing::AssertionResult failure = ::testing::AssertionFailure();
-            failure << "\"" << text << "\" missing or out of order in:";
-            for (const std::string& line : all) failure << "\n  " << line;
-            return failure;
-        }
-        from = it + 1;
-    }
-    return ::testing::AssertionSuccess();
-}
-
-// One transaction as "code <c> flags <f>: <int32> <int32> ...", so the byte
-// count (no interface token in front) and the values are checked in one go.
-inline std::string describe(uint32_t code, const uint8_t* bytes, size_t size, uint32_t flags) {
-    std::string out = "code " + std::to_string(code) + " flags " + std::to_string(flags) + ":";
-    for (size_t at = 0; at + sizeof(int32_t) <= size; at += sizeof(int32_t)) {
-        int32_t v;
-        memcpy(&v, bytes + at, sizeof(v));
-        out += " " + std::to_string(v);
-    }
-    if (size % sizeof(int32_t) != 0) out += " +" + std::to_string(size % sizeof(int32_t)) + " bytes";
-    return out;
-}
-// What the client's callback received, one transaction a line.
-inline Strings received(const hostbinder::RemoteBinder& client) {
-    Strings out;
-    for (const auto& t : client.transactions())
-        out.push_back(describe(t.code, t.data.data(), t.data.size(), t.flags));
-    return out;
-}
+using enginetest::describe;
+using enginetest::inOrder;
+using enginetest::received;
 
 class EngineCase : public ::testing::Test {
 protected:

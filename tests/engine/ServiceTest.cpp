@@ -144,11 +144,6 @@ TEST_F(ServiceTest, EachCodeReadsItsFieldsAnswersAndReachesItsOperation) {
     EXPECT_EQ("I init, loopback? 0 E", linesOf(kEngineTag).at(0));
 }
 
-TEST_F(ServiceTest, CameraIdAnswersWhatTheEngineReturns) {
-    hostfakes::setResult("camdrvOpen", 0);  // the driver hands out no capture
-    EXPECT_EQ(answer(-1), show(call(kCameraId, {0})));
-}
-
 TEST_F(ServiceTest, OtherCodesGetThePlatformsDefaultHandling) {
     for (uint32_t code : {5u, 12u, 19u, 0x7FFFFFFFu, 0x80000000u, 0xFFFFFFFFu}) {
         SCOPED_TRACE("code " + std::to_string(static_cast<int32_t>(code)));

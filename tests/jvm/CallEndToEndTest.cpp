@@ -3,9 +3,6 @@
 // process drives the service over binder, the modem starts and ends the
 // stream over the pipe (changes mid-call: the engine's own tests), the
 // engines' threads report events, and the client's death ends the call.
-#include <algorithm>
-
-#include "EngineHarness.h"
 #include "JvmHarness.h"
 #include "VtspRecord.h"
 
@@ -20,26 +17,13 @@ constexpr const char* kFront = "Camera 1, Facing front, Orientation 270";
 const char* const kRemoteSize =
         "{\"Render\":\"Remote\",\"SourceType\":0,\"Window\":1,\"Width\":640,\"Height\":480}";
 
-// Sends one record from the modem and waits until every call has been
+// Sends one record from the modem and waits until these calls have been
 // recorded after it, in this order.
-::testing::AssertionResult sendAndExpect(const android::VPR_Comm& record, const V& expected) {
+::testing::AssertionResult sendAndExpect(const android::VPR_Comm& record, std::initializer_list<std::string> expected) {
     const size_t mark = hostfakes::callCount();
     enginetest::modem().writeRecord(record);
-    V seen;
-    const bool done = eventually([&] {
-        seen = hostfakes::callTextsSince(mark);
-        auto from = seen.begin();
-        for (const std::string& call : expected) {
-            from = std::find(from, seen.end(), call);
-            if (from == seen.end()) return false;
-            ++from;
-        }
-        return true;
-    });
-    if (done) return ::testing::AssertionSuccess();
-    ::testing::AssertionResult failure = ::testing::AssertionFailure() << "calls missing or out of order in:";
-    for (const std::string& call : seen) failure << "\n  " << call;
-    return failure;
+    eventually([&] { return inOrder(hostfakes::callTextsSince(mark), expected); });
+    return inOrder(hostfakes::callTextsSince(mark), expected);
 }
 
 android::VPR_Comm stream(int32_t code, uint32_t dir = android::VTSP_STREAM_DIR_SENDRECV) {
@@ -97,7 +81,7 @@ TEST_F(CallEndToEndTest, AWholeCallFromLoadToTheClientsDeath) {
     // the client (the Java-bound ones: MmeVideoEventTest).
     ASSERT_TRUE(hostfakes::fireZmfEvent(27, kRemoteSize));
     for (int event : {22, 23}) EXPECT_EQ(0, hostfakes::fireMvdEvent(mvdEvent(event)));
-    EXPECT_EQ((V{"code 1: 11 640 480 0", "code 0: 14", "code 0: 15"}), received(*client));
+    EXPECT_EQ((V{"code 1 flags 0: 11 640 480 0", "code 0 flags 0: 14", "code 0 flags 0: 15"}), received(*client));
 
     // The modem ends the stream.
     EXPECT_TRUE(sendAndExpect(stream(android::_VTSP_CMD_STREAM_VIDEO_END), {"Mvd_Close(1) = 0"}));

@@ -11,7 +11,6 @@
 #include <mutex>
 #include <stdexcept>
 
-#include "EngineHarness.h"
 
 namespace jvmtest {
 
@@ -258,20 +257,6 @@ int32_t sendToService(uint32_t code, std::initializer_list<int32_t> ints,
     if (status != android::NO_ERROR) return -1000 - status;
     reply.setDataPosition(0);
     return reply.readInt32();
-}
-
-V received(const hostbinder::RemoteBinder& client) {
-    V out;
-    for (const hostbinder::RemoteBinder::Transaction& t : client.transactions()) {
-        std::string text = "code " + std::to_string(t.code) + ":";
-        for (size_t at = 0; at + sizeof(int32_t) <= t.data.size(); at += sizeof(int32_t)) {
-            int32_t v;
-            memcpy(&v, t.data.data() + at, sizeof(v));
-            text += " " + std::to_string(v);
-        }
-        out.push_back(text);
-    }
-    return out;
 }
 
 void JvmCase::SetUp() {

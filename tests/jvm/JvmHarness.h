@@ -24,6 +24,7 @@
 #include <utility>
 #include <vector>
 
+#include "EngineHarness.h"
 #include "Eventually.h"
 #include "HostFakes.h"
 #include "LogCapture.h"
@@ -31,6 +32,9 @@
 #include "RemoteBinder.h"
 
 namespace jvmtest {
+
+using enginetest::inOrder;
+using enginetest::received;
 
 // Texts in order (calls, log lines, upcalls), and two such lists joined.
 using V = std::vector<std::string>;
@@ -130,9 +134,6 @@ jint vceServiceInit();
 android::sp<android::IBinder> registeredService();
 int32_t sendToService(uint32_t code, std::initializer_list<int32_t> ints = {},
                       const android::sp<android::IBinder>& binder = nullptr);
-
-// What a client's binder received, one "code <c>: <int32> <int32> ..." each.
-V received(const hostbinder::RemoteBinder& client);
 
 // Runs fn on a new native thread, which no JVM knows, and returns its result.
 template <typename Fn>

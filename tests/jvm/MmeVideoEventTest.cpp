@@ -144,7 +144,7 @@ TEST_F(MmeVideoEventTest, RtpStreamEventsGoToTheEngineAndOnToTheClient) {
     for (int event : {kRtpBreak, kRtpReceived, kRtpFirstPacket}) {
         EXPECT_EQ(0, hostfakes::fireMvdEvent(mvdEvent(event)));
     }
-    EXPECT_EQ((V{"code 0: 14", "code 0: 15"}), received(*client));
+    EXPECT_EQ((V{"code 0 flags 0: 14", "code 0 flags 0: 15"}), received(*client));
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "VideoCallEngineImpl", "mmeEvtUpdate evt: 21"));
     EXPECT_TRUE(upcalls().empty()) << "stream events do not go to Java";
 }

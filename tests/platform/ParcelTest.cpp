@@ -5,7 +5,6 @@
 #include <fcntl.h>
 #include <gtest/gtest.h>
 #include <unistd.h>
-#include <utils/String8.h>
 
 #include <cstring>
 #include <vector>
@@ -58,35 +57,6 @@ TEST(Parcel, IntegersAreLittleEndianWordsAndReadsPastTheEndDoNotMove) {
     EXPECT_EQ(nullptr, p.readInplace(4));
 }
 
-TEST(Parcel, SetDataCopiesBytesAndResizingLeavesZerosNotOldBytes) {
-    Parcel source;
-    for (int32_t v : {11, 22}) source.writeInt32(v);
-    Parcel p;
-    p.writeInt32(99);  // replaced, not appended to
-    ASSERT_EQ(NO_ERROR, p.setData(source.data(), 6));
-    EXPECT_EQ(6u, p.dataSize());
-    EXPECT_EQ(0u, p.dataPosition());
-    source.setDataPosition(0);
-    source.writeInt32(33);  // the copy owns its bytes
-    EXPECT_EQ(11, p.readInt32());
-    EXPECT_EQ(0, p.readInt32());  // half of the 22 is not a word
-    EXPECT_EQ(BAD_VALUE, p.setData(nullptr, 4));
-
-    p.freeData();
-    for (int32_t v : {1, 2, 3}) p.writeInt32(v);
-    ASSERT_EQ(NO_ERROR, p.setDataSize(4));
-    EXPECT_EQ(4u, p.dataPosition());
-    ASSERT_EQ(NO_ERROR, p.setDataSize(8));
-    p.setDataPosition(16);
-    p.writeInt32(7);
-    EXPECT_EQ(20u, p.dataSize());
-    p.setDataPosition(0);
-    for (int32_t v : {1, 0, 0, 0, 7}) EXPECT_EQ(v, p.readInt32());  // not the old 2 and 3
-    p.freeData();
-    EXPECT_EQ(0u, p.dataSize());
-    EXPECT_EQ(0u, p.dataPosition());
-}
-
 TEST(Parcel, CStringsArePaddedWithZerosToWholeWordsAndNeedATerminator) {
     Parcel p;
     p.writeCString("abc");  // 3 + NUL: one word
@@ -116,43 +86,6 @@ TEST(Parcel, CStringsArePaddedWithZerosToWholeWordsAndNeedATerminator) {
     EXPECT_EQ(0u, p.dataAvail());
 }
 
-TEST(Parcel, StringsRoundTripWithTheirLengthPrefixesAndTokensAreEnforced) {
-    Parcel p;
-    p.writeString8(String8("quell"));  // length, then 5 chars + NUL padded
-    p.writeString8(String8());  // the length alone
-    p.writeString16(String16("born"));  // length, then 4 UTF-16 chars + NUL padded
-    EXPECT_EQ(12u + 4u + 16u, p.dataSize());
-    p.writeString16(nullptr, 0);
-    p.writeInt32(3);
-
-    p.setDataPosition(0);
-    EXPECT_EQ(String8("quell"), p.readString8());
-    String8 empty("x");
-    EXPECT_EQ(NO_ERROR, p.readString8(&empty));
-    EXPECT_EQ(0u, empty.length());
-    EXPECT_EQ(String16("born"), p.readString16());
-    String16 missing("y");
-    EXPECT_EQ(UNEXPECTED_NULL, p.readString16(&missing));
-    EXPECT_EQ(0u, missing.size());
-    EXPECT_EQ(3, p.readInt32());
-
-    Parcel truncated;  // a length that runs past the data
-    truncated.writeInt32(100);
-    truncated.writeInt32(0x41414141);
-    truncated.setDataPosition(0);
-    EXPECT_EQ(BAD_VALUE, truncated.readString8(&empty));
-
-    // An interface token is enforced by its descriptor.
-    p.freeData();
-    p.writeInterfaceToken(String16("android.test.IFoo"));
-    p.writeInt32(5);
-    p.setDataPosition(0);
-    EXPECT_TRUE(p.enforceInterface(String16("android.test.IFoo")));
-    EXPECT_EQ(5, p.readInt32());
-    p.setDataPosition(0);
-    EXPECT_FALSE(p.enforceInterface(String16("android.test.IBar")));
-}
-
 TEST(Parcel, StrongBinderRoundTripsAndIsKeptAliveByTheParcel) {
     wp<IBinder> weak;
     {
@@ -170,22 +103,6 @@ TEST(Parcel, StrongBinderRoundTripsAndIsKeptAliveByTheParcel) {
         EXPECT_EQ(2, p.readInt32());
     }
     EXPECT_EQ(nullptr, weak.promote());
-}
-
-TEST(Parcel, FreeingOrCuttingTheDataReleasesItsBinders) {
-    Parcel p;
-    const wp<IBinder> first = writeFreshBinder(&p);
-    const wp<IBinder> second = writeFreshBinder(&p);
-    ASSERT_EQ(NO_ERROR, p.setDataSize(24));
-    EXPECT_EQ(1u, p.objectsCount());
-    EXPECT_NE(nullptr, first.promote());
-    EXPECT_EQ(nullptr, second.promote());
-    p.freeData();
-    EXPECT_EQ(0u, p.objectsCount());
-    EXPECT_EQ(nullptr, first.promote());
-    const wp<IBinder> third = writeFreshBinder(&p);
-    p.setData(nullptr, 0);
-    EXPECT_EQ(nullptr, third.promote());
 }
 
 TEST(Parcel, BindersAreReadOnlyFromTheParcelsOwnRecords) {

@@ -10,27 +10,22 @@
 #include <thread>
 #include <vector>
 
+#include "Eventually.h"
+
 using namespace android;
 using hostbinder::RemoteBinder;
 using namespace std::chrono_literals;
 
 namespace {
 
-// Counts its notices; may unlink itself from inside one, as a client cleaning up would.
-class Recipient : public IBinder::DeathRecipient {
-public:
-    explicit Recipient(bool unlinkWhenNotified = false) : mUnlink(unlinkWhenNotified) {}
+// Counts its notices.
+struct Recipient : IBinder::DeathRecipient {
     void binderDied(const wp<IBinder>& who) override {
         ++deaths;
         from = who.unsafe_get();
-        if (mUnlink) unlinkResult = who.promote()->unlinkToDeath(this);
     }
     int deaths = 0;
     IBinder* from = nullptr;
-    status_t unlinkResult = NO_ERROR;
-
-private:
-    const bool mUnlink;
 };
 
 void writeInts(Parcel* p, std::initializer_list<int32_t> values) {
@@ -78,15 +73,6 @@ TEST(RemoteBinder, TransactCopiesAndRecordsTheRequestAndCopiesBackTheReplyUnless
     EXPECT_EQ(1u, record[1].code);
     EXPECT_EQ(bytesOf({1, 2, 3, 4}), record[1].data);
     EXPECT_EQ(static_cast<uint32_t>(IBinder::FLAG_ONEWAY), record[1].flags);
-    remote->clearTransactions();
-    EXPECT_EQ(0u, remote->transactionCount());
-
-    // Without a handler every call succeeds with an empty reply.
-    sp<RemoteBinder> silent = new RemoteBinder();
-    EXPECT_EQ(NO_ERROR, silent->transact(0, one, &reply));
-    EXPECT_EQ(0u, reply.dataSize());
-    EXPECT_EQ(1u, silent->transactionCount());
-    EXPECT_EQ(0u, silent->getInterfaceDescriptor().size());
 }
 
 TEST(RemoteBinder, IsAProxyOfItsDescriptorUntilKilledThenNotifiesEachLinkOnceAndRefusesCalls) {
@@ -128,39 +114,6 @@ TEST(RemoteBinder, IsAProxyOfItsDescriptorUntilKilledThenNotifiesEachLinkOnceAnd
     EXPECT_EQ(DEAD_OBJECT, remote->unlinkToDeath(a));
 }
 
-TEST(RemoteBinder, UnlinkRemovesTheMatchingLinkOnlyAndLinksHoldRecipientsWeakly) {
-    sp<RemoteBinder> remote = new RemoteBinder();
-    sp<Recipient> a = new Recipient();
-    sp<Recipient> b = new Recipient();
-    int cookie = 0;
-    remote->linkToDeath(a);
-    remote->linkToDeath(b, &cookie, 0);
-    sp<Recipient> stranger = new Recipient();
-    EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(stranger));
-    EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(a, nullptr, 1));  // the flags must match
-    wp<IBinder::DeathRecipient> removed;
-    EXPECT_EQ(NO_ERROR, remote->unlinkToDeath(a, nullptr, 0, &removed));
-    EXPECT_EQ(a.get(), removed.unsafe_get());
-    EXPECT_EQ(NAME_NOT_FOUND, remote->unlinkToDeath(a));
-    EXPECT_EQ(NO_ERROR, remote->unlinkToDeath(nullptr, &cookie));  // with no recipient, the cookie names the link
-    EXPECT_EQ(0u, remote->deathRecipientCount());
-
-    wp<Recipient> gone;
-    {
-        sp<Recipient> shortLived = new Recipient();
-        gone = shortLived;
-        remote->linkToDeath(shortLived);
-    }
-    EXPECT_EQ(nullptr, gone.promote());
-    sp<Recipient> unlinking = new Recipient(true);
-    remote->linkToDeath(unlinking);
-    EXPECT_EQ(2u, remote->deathRecipientCount());
-    remote->kill();  // must neither deadlock nor touch the dropped recipient
-    EXPECT_EQ(DEAD_OBJECT, unlinking->unlinkResult);
-    EXPECT_EQ(0, a->deaths + b->deaths);
-    EXPECT_EQ(BAD_VALUE, remote->linkToDeath(nullptr));  // null is refused before death is looked at
-}
-
 TEST(RemoteBinder, DeathDuringASlowCallFailsThatCall) {
     std::atomic<bool> inHandler{false};
     sp<RemoteBinder> remote = new RemoteBinder([&](uint32_t, const Parcel&, Parcel* reply, uint32_t) {
@@ -172,35 +125,11 @@ TEST(RemoteBinder, DeathDuringASlowCallFailsThatCall) {
     Parcel data, reply;
     std::thread caller([&] { result = remote->transact(0, data, &reply); });
     // The record is made before the handler runs; wait until it is running.
-    const auto deadline = std::chrono::steady_clock::now() + 5s;
-    while (!inHandler.load() && std::chrono::steady_clock::now() < deadline) std::this_thread::sleep_for(1ms);
-    EXPECT_TRUE(inHandler.load());
+    ASSERT_TRUE(eventually([&] { return inHandler.load(); }));
     remote->kill();
     caller.join();
     EXPECT_EQ(DEAD_OBJECT, result);
     EXPECT_EQ(0u, reply.dataSize());
-}
-
-TEST(RemoteBinder, TransactionsFromManyThreadsAreAllRecorded) {
-    sp<RemoteBinder> remote = new RemoteBinder([](uint32_t, const Parcel& data, Parcel* reply, uint32_t) {
-        return reply->writeInt32(data.readInt32());
-    });
-    EXPECT_FALSE(remote->waitForTransactions(1, 10ms));
-    std::vector<std::thread> threads;
-    std::atomic<int> mismatches{0};
-    for (int t = 0; t < 4; ++t) {
-        threads.emplace_back([&, t] {
-            for (int i = 0; i < 50; ++i) {
-                Parcel data, reply;
-                data.writeInt32(t * 1000 + i);
-                if (remote->transact(0, data, &reply) != NO_ERROR || reply.readInt32() != t * 1000 + i) ++mismatches;
-            }
-        });
-    }
-    EXPECT_TRUE(remote->waitForTransactions(200, 5s));
-    for (auto& t : threads) t.join();
-    EXPECT_EQ(0, mismatches.load());
-    EXPECT_EQ(200u, remote->transactionCount());
 }
 
 // The driver runs a call that the other process makes while being called

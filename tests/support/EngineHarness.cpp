@@ -3,7 +3,9 @@
 #include <binder/IServiceManager.h>
 #include <utils/String16.h>
 
+#include <algorithm>
 #include <cstdlib>
+#include <cstring>
 
 #include "VideoCallEngineService.h"
 
@@ -60,6 +62,38 @@ sp<hostbinder::RemoteBinder> remoteCallback() {
 
 sp<hostbinder::RemoteBinder> remoteProducer() {
     return new hostbinder::RemoteBinder({}, String16("android.gui.IGraphicBufferProducer"));
+}
+
+std::string describe(uint32_t code, const uint8_t* bytes, size_t size, uint32_t flags) {
+    std::string out = "code " + std::to_string(code) + " flags " + std::to_string(flags) + ":";
+    for (size_t at = 0; at + sizeof(int32_t) <= size; at += sizeof(int32_t)) {
+        int32_t v;
+        memcpy(&v, bytes + at, sizeof(v));
+        out += " " + std::to_string(v);
+    }
+    if (size % sizeof(int32_t) != 0) out += " +" + std::to_string(size % sizeof(int32_t)) + " bytes";
+    return out;
+}
+
+std::vector<std::string> received(const hostbinder::RemoteBinder& client) {
+    std::vector<std::string> out;
+    for (const auto& t : client.transactions()) out.push_back(describe(t.code, t.data.data(), t.data.size(), t.flags));
+    return out;
+}
+
+::testing::AssertionResult inOrder(const std::vector<std::string>& all, std::initializer_list<std::string> texts) {
+    auto from = all.begin();
+    for (const std::string& text : texts) {
+        const auto it = std::find(from, all.end(), text);
+        if (it == all.end()) {
+            ::testing::AssertionResult failure = ::testing::AssertionFailure();
+            failure << "\"" << text << "\" missing or out of order in:";
+            for (const std::string& line : all) failure << "\n  " << line;
+            return failure;
+        }
+        from = it + 1;
+    }
+    return ::testing::AssertionSuccess();
 }
 
 }  // namespace enginetest

@@ -8,7 +8,11 @@
 #include <binder/Parcel.h>
 #include <utils/StrongPointer.h>
 
+#include <gtest/gtest.h>
+
 #include <initializer_list>
+#include <string>
+#include <vector>
 
 #include "ModemPty.h"
 #include "RemoteBinder.h"
@@ -38,6 +42,15 @@ Reply call(uint32_t code, const android::Parcel& request);
 android::sp<hostbinder::RemoteBinder> remoteCallback();
 // A client's buffer producer in its own process.
 android::sp<hostbinder::RemoteBinder> remoteProducer();
+
+// One transaction as "code <c> flags <f>: <int32> <int32> ...", so the byte
+// count (no interface token in front) and the values are checked in one go.
+std::string describe(uint32_t code, const uint8_t* bytes, size_t size, uint32_t flags);
+// What a client's binder received, one transaction a line.
+std::vector<std::string> received(const hostbinder::RemoteBinder& client);
+
+// Each text appears in `all`, after the one before it.
+::testing::AssertionResult inOrder(const std::vector<std::string>& all, std::initializer_list<std::string> texts);
 
 }  // namespace enginetest
 

@@ -1,10 +1,13 @@
 // The modem command link run on a raw pseudo-terminal with its real threads:
 // record assembly and routing, a whole call from the modem's side, pausing,
-// shutdown in every state, a flood held back at the pipe, an unusable device
-// and garbage on the pipe.
+// shutdown in every state, a flood held back at the pipe, an unusable device,
+// garbage on the pipe, SIGUSR1 storms and a device that refuses reads or
+// writes for a while. Every record accepted while the link runs is handled
+// exactly once and every reply is written whole.
 #include <android/log.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
+#include <pthread.h>
 #include <signal.h>
 #include <sys/types.h>
 #include <unistd.h>
@@ -16,6 +19,7 @@
 #include <fstream>
 #include <future>
 #include <random>
+#include <set>
 #include <string>
 #include <thread>
 #include <vector>
@@ -45,43 +49,27 @@ const char* const kRefused = "pushAndSignal: failed to push elem";
 const std::string kWholeBind = "target 1, type 0, length 3664, code 7: ";
 const char* const kReadFailed = "readFromVpr: cmdRxFunc: failed to read file, error ";
 
-// Name and scheduler state ('S' while asleep in the kernel) of each of our threads.
-std::vector<std::pair<std::string, char>> threads() {
-    std::vector<std::pair<std::string, char>> out;
+// How many of our threads carry `name` and, unless `state` is 0, are in that
+// scheduler state ('S' while asleep in the kernel).
+size_t threadsNamed(const std::string& name, char state = 0) {
+    size_t n = 0;
     for (const auto& entry : std::filesystem::directory_iterator("/proc/self/task")) {
         std::ifstream commFile(entry.path() / "comm"), statFile(entry.path() / "stat");
-        std::string name, stat((std::istreambuf_iterator<char>(statFile)), std::istreambuf_iterator<char>());
-        std::getline(commFile, name);
+        std::string comm, stat((std::istreambuf_iterator<char>(statFile)), std::istreambuf_iterator<char>());
+        std::getline(commFile, comm);
         const size_t paren = stat.rfind(')');
-        out.emplace_back(name, paren != std::string::npos && paren + 2 < stat.size() ? stat[paren + 2] : '?');
+        n += comm == name && (state == 0 || (paren != std::string::npos && paren + 2 < stat.size() &&
+                                             stat[paren + 2] == state));
     }
-    return out;
-}
-
-size_t threadsNamed(const std::string& name) {
-    const auto all = threads();
-    return static_cast<size_t>(std::count_if(all.begin(), all.end(), [&](const auto& t) { return t.first == name; }));
+    return n;
 }
 
 // True when each of the link's three threads exists exactly `count` times.
-bool linkThreads(size_t count, bool sleepingOnly = false) {
-    const auto all = threads();
+bool linkThreads(size_t count, char state = 0) {
     for (const char* name : {"tVtspCmdRx", "tVtspCmdHd", "tVtspCmdTx"}) {
-        if (count != static_cast<size_t>(std::count_if(all.begin(), all.end(), [&](const auto& t) {
-                return t.first == name && (!sleepingOnly || t.second == 'S');
-            }))) {
-            return false;
-        }
+        if (threadsNamed(name, state) != count) return false;
     }
     return true;
-}
-
-// Scheduler state of the link thread `name`, '?' if it does not exist.
-char threadState(const std::string& name) {
-    for (const auto& t : threads()) {
-        if (t.first == name) return t.second;
-    }
-    return '?';
 }
 
 // Waits until the media engine has been asked `text`.
@@ -160,6 +148,30 @@ protected:
                std::to_string(b.streamId) + " at " + endpointText(b.addr);
     }
 
+    // Reads `n` replies, each a whole bind request; answers the streams they name.
+    std::multiset<int32_t> readBinds(size_t n) {
+        std::multiset<int32_t> ids;
+        for (size_t i = 0; i < n; ++i) {
+            const std::string b = readBind();
+            if (b.rfind(kWholeBind + "stream ", 0) != 0) {
+                ADD_FAILURE() << "reply " << i << " of " << n << ": " << b;
+                break;
+            }
+            ids.insert(std::stoi(b.substr(kWholeBind.size() + 7)));
+        }
+        return ids;
+    }
+    static std::multiset<int32_t> range(int32_t first, int32_t last) {
+        std::multiset<int32_t> ids;
+        for (int32_t id = first; id <= last; ++id) ids.insert(id);
+        return ids;
+    }
+    size_t recvLines() const {
+        size_t n = 0;
+        for (const LogLine& l : log.linesWithTag(kTag)) n += l.text.rfind("cmdRxFunc, recv msg ", 0) == 0;
+        return n;
+    }
+
     // Starts the link with the media engine not answering: the handling
     // thread takes a first start and waits in the engine, so every later
     // command stays queued.
@@ -190,9 +202,9 @@ protected:
 
 TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     startLink();
-    // The start arrives in short writes and is still routed once.
+    // The start arrives one byte a write and is still routed once.
     StreamCommand start = startCommand(7);
-    pty.writeRecord(streamRecord(start), 100, 1ms);
+    pty.writeRecord(streamRecord(start), 1);
     // The reply goes out in wire order (read back here in host order); how
     // a body is turned and composed is CmdBufferTest's business.
     EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
@@ -244,26 +256,10 @@ TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
     EXPECT_EQ("Mvd_Open(\"10.0.0.9\", 6010, out=1) = 0", hostfakes::callTexts().at(0));
 }
 
-TEST_F(VtspManagerTest, StoppedLinkDropsCommandsUntilStartedAgain) {
-    startLink();
-    link.stop();
-    pty.writeRecord(streamRecord(startCommand(7)));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)));
-
-    link.start();
-    pty.writeRecord(streamRecord(startCommand(8, "10.0.0.8", 6008)));
-    EXPECT_EQ(kWholeBind + "stream 8 at 10.0.0.8:6008", readBind());
-    // The refused command never reached the media engine, before or after.
-    EXPECT_EQ("Mvd_Open(\"10.0.0.8\", 6008, out=1) = 0", hostfakes::callTexts().at(0));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_EQ(1u, link.mCmdCallback->streamCount());
-}
-
 TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     startLink();
     // Named threads, each sleeping: the receiver in read, the others in their queues.
-    ASSERT_TRUE(eventually([] { return linkThreads(1, true); }));
+    ASSERT_TRUE(eventually([] { return linkThreads(1, 'S'); }));
     ASSERT_EQ(2u, openDescriptorsOn(pty.devicePath()));  // ours and the link's
     auto before = Clock::now();
     destroyLink();
@@ -280,10 +276,8 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     startLink();
     const int fd = link.mFd;
     ASSERT_NE(-1, fd);
-    const size_t count = threads().size();
     EXPECT_TRUE(link.init());
     EXPECT_EQ(fd, link.mFd);
-    EXPECT_EQ(count, threads().size());
     EXPECT_EQ(2u, openDescriptorsOn(pty.devicePath()));
     // A round trip gives any extra thread time to announce itself.
     pty.writeRecord(streamRecord(startCommand(7)));
@@ -326,7 +320,7 @@ TEST_F(VtspManagerTest, ReplyCutShortByDestroyIsFinishedFirstWhenTheLinkRunsAgai
         std::this_thread::sleep_for(50ms);
         const size_t now = log.count(ANDROID_LOG_DEBUG, kTag, kWritten);
         written = now;
-        return now == before && now < kStarts && threadState("tVtspCmdTx") == 'S';
+        return now == before && now < kStarts && threadsNamed("tVtspCmdTx", 'S') == 1;
     }));
     destroyLink();
     const std::string cut = "writeToVpr: " + std::string(pty.devicePath()) + " took ";
@@ -363,7 +357,7 @@ TEST_F(VtspManagerTest, LinkStartedWithSigusr1BlockedStillEnds) {
 TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirst) {
     auto running = std::make_unique<VtspManager>(pty.devicePath());
     ASSERT_TRUE(running->init());
-    ASSERT_TRUE(eventually([] { return linkThreads(1, true); }));
+    ASSERT_TRUE(eventually([] { return linkThreads(1, 'S'); }));
     running.reset();
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
     EXPECT_EQ(1u, openDescriptorsOn(pty.devicePath()));
@@ -443,21 +437,11 @@ TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
     }
 }
 
-TEST_F(VtspManagerTest, DestroyWithoutThreadsOnlyClosesAnOpenDevice) {
-    const int fd = open(pty.devicePath(), O_RDWR | O_NOCTTY);
-    ASSERT_GE(fd, 0);
-    link.mFd = fd;
-    const auto before = Clock::now();
-    link.destroy();
-    EXPECT_LT(msSince(before), 1800);
-    EXPECT_EQ(-1, link.mFd);
-    EXPECT_EQ(-1, fcntl(fd, F_GETFD));
-    EXPECT_EQ(EBADF, errno);
-
+TEST_F(VtspManagerTest, DestroyWithoutInitWakesNoThread) {
     VtspManager closed(pty.devicePath());
     closed.destroy();
     EXPECT_EQ(-1, closed.mFd);
-    EXPECT_TRUE(log.linesWithTag(kTag).empty());  // no thread ran, none was woken
+    EXPECT_TRUE(log.linesWithTag(kTag).empty());
 }
 
 // A device that cannot be opened, or that is at its end, is a failed read
@@ -523,4 +507,125 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
     }
     EXPECT_EQ(expected, bind);
     EXPECT_TRUE(link.mCmdCallback->snapshot(4242));
+}
+
+TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
+    startLink();
+    const pthread_t targets[] = {link.mRxThread, link.mTxThread, link.mHandleThread};
+    std::atomic<bool> storming{true};
+    std::atomic<int> sent{0};
+    std::thread storm([&] {
+        while (storming) {
+            for (pthread_t t : targets) pthread_kill(t, SIGUSR1);
+            ++sent;
+            std::this_thread::sleep_for(1ms);
+        }
+    });
+    constexpr int kRecords = 30;
+    const auto stormBegan = Clock::now();
+    while (sent < 20 && msSince(stormBegan) < 5000) std::this_thread::sleep_for(1ms);
+    // Short writes with pauses so the receiver is interrupted in the middle of records too.
+    for (int id = 1; id <= kRecords; ++id) pty.writeRecord(streamRecord(startCommand(id)), 1000, 1ms);
+    const std::multiset<int32_t> ids = readBinds(kRecords);
+    storming = false;
+    storm.join();
+    EXPECT_GT(sent.load(), 50);
+    EXPECT_EQ(range(1, kRecords), ids);
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(static_cast<size_t>(kRecords), recvLines());
+    EXPECT_EQ(static_cast<size_t>(kRecords), hostfakes::callCount("Mvd_Open"));
+    EXPECT_EQ(static_cast<size_t>(kRecords), link.mCmdCallback->streamCount());
+}
+
+// The link's descriptor is swapped for a read-only one on the same device:
+// reads still work, every write fails.
+TEST_F(VtspManagerTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
+    startLink();
+    const int readOnly = open(pty.devicePath(), O_RDONLY | O_NOCTTY);
+    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
+    ASSERT_GE(readOnly, 0);
+    ASSERT_GE(readWrite, 0);
+    ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
+    const std::string failed = "Failed to write data to " + std::string(pty.devicePath()) +
+                               ", err: Bad file descriptor";
+
+    pty.writeRecord(streamRecord(startCommand(5)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
+
+    // The device works again: the pending reply goes out whole, once.
+    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
+    EXPECT_EQ(range(5, 5), readBinds(1));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
+
+    // Failing again, destroy still returns promptly.
+    ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
+    pty.writeRecord(streamRecord(startCommand(6)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 4, 8s));
+    const auto before = Clock::now();
+    destroyLink();
+    EXPECT_LT(msSince(before), 1800);  // shorter than the 2 s retry pause
+    EXPECT_EQ(-1, link.mFd);
+    close(readOnly);
+    close(readWrite);
+}
+
+TEST_F(VtspManagerTest, FailedReadIsRetriedAfterAPauseAndResumes) {
+    startLink();
+    const int writeOnly = open(pty.devicePath(), O_WRONLY | O_NOCTTY);
+    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
+    ASSERT_GE(writeOnly, 0);
+    ASSERT_GE(readWrite, 0);
+    pty.writeRecord(streamRecord(startCommand(10)));
+    EXPECT_EQ(range(10, 10), readBinds(1));
+    ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
+    const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
+
+    // The receive thread may already sit in a read that keeps the old
+    // descriptor, which record 11 then completes; either way the reads after
+    // that fail, and record 11 is read once, before or after the repair.
+    pty.writeRecord(streamRecord(startCommand(11)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
+    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
+
+    // The device works again: the next record is read whole and handled once.
+    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
+    pty.writeRecord(streamRecord(startCommand(12)));
+    EXPECT_EQ(range(11, 12), readBinds(2));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(3u, hostfakes::callCount("Mvd_Open"));
+    EXPECT_EQ(3u, recvLines());
+    close(writeOnly);
+    close(readWrite);
+}
+
+TEST_F(VtspManagerTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
+    startLink();
+    constexpr int kPerPhase = 5;
+    size_t refused = 0;
+    for (int cycle = 0; cycle < 3; ++cycle) {
+        SCOPED_TRACE(cycle);
+        const int running = 100 * cycle + 1, stopped = 100 * cycle + 50;
+        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(running + i)));
+        EXPECT_EQ(range(running, running + kPerPhase - 1), readBinds(kPerPhase));
+        link.stop();
+        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(stopped + i)));
+        refused += kPerPhase;
+        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, refused));
+        link.start();
+    }
+    const int last = 1000;
+    pty.writeRecord(streamRecord(startCommand(last)));
+    EXPECT_EQ(range(last, last), readBinds(1));
+    EXPECT_TRUE(pty.silentFor(100ms));
+    EXPECT_EQ(refused, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
+    EXPECT_EQ(2 * refused + 1, recvLines());
+    EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
+    for (int cycle = 0; cycle < 3; ++cycle) {
+        for (int i = 0; i < kPerPhase; ++i) {
+            EXPECT_TRUE(link.mCmdCallback->snapshot(100 * cycle + 1 + i));
+            EXPECT_FALSE(link.mCmdCallback->snapshot(100 * cycle + 50 + i));
+        }
+    }
 }
