@@ -8,7 +8,6 @@
 
 using namespace jvmtest;
 using namespace vtspcodec;
-using ::testing::Contains;
 
 namespace {
 
@@ -60,8 +59,6 @@ TEST_F(CallEndToEndTest, AWholeCallFromLoadToTheClientsDeath) {
     ASSERT_EQ(0, sendToService(kSetSurface, {0}, enginetest::remoteProducer()));
     ASSERT_EQ(0, sendToService(kSetSurface, {1}, enginetest::remoteProducer()));
     ASSERT_EQ(0, sendToService(kCameraId, {1}));
-    EXPECT_EQ(1u, hostfakes::openCameras().size());
-    EXPECT_EQ((V{kFront, "Remote"}), hostfakes::activeRenders());
 
     // The modem starts the stream and gets its bind request back.
     EXPECT_TRUE(sendAndExpect(
@@ -71,11 +68,7 @@ TEST_F(CallEndToEndTest, AWholeCallFromLoadToTheClientsDeath) {
              std::string("Mvd_CaptureAttach(1, \"") + kFront + "\") = 0"}));
     android::VPR_Comm reply{};
     ASSERT_TRUE(modem.readRecord(&reply)) << "no bind request on the pipe";
-    // (The record's other fields: the link's own tests.)
-    const BindRequest bind = readBindRequest(reply);
-    EXPECT_EQ(android::VPR_NET_CMD_BIND, bind.code);
-    EXPECT_EQ(1, bind.streamId);
-    EXPECT_EQ("10.0.0.1:6000", endpointText(bind.addr));
+    EXPECT_EQ(1, readBindRequest(reply).streamId);  // (its other fields: the link's own tests)
 
     // Events from the video library's and the media engine's threads reach
     // the client (the Java-bound ones: MmeVideoEventTest).
@@ -85,16 +78,12 @@ TEST_F(CallEndToEndTest, AWholeCallFromLoadToTheClientsDeath) {
 
     // The modem ends the stream.
     EXPECT_TRUE(sendAndExpect(stream(android::_VTSP_CMD_STREAM_VIDEO_END), {"Mvd_Close(1) = 0"}));
-    EXPECT_TRUE(hostfakes::openMvdStreams().empty());
 
     // The client's process dies: the engine lets go of camera and views.
     client->kill();
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "VideoCallEngineService", "binderDied, ims app died"));
     EXPECT_TRUE(hostfakes::openCameras().empty());
     EXPECT_TRUE(eventually([] { return hostfakes::activeRenders().empty(); })) << "views still shown";
-    EXPECT_EQ(0, hostfakes::fireMvdEvent(mvdEvent(22)));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "VideoCallEngineImpl", "notifyCallback null"));
-    EXPECT_THAT(hostfakes::callTexts(), Contains("camdrvStop(256) = 0"));
 
     EXPECT_EQ(0, mme("sysDestroy", "()I"));
 }

@@ -111,21 +111,10 @@ protected:
 }  // namespace
 
 TEST_F(CmdCallbackMvdTest, StreamLivesFromItsStartUntilItsEnd) {
-    StreamCommand start = streamCmd(_VTSP_CMD_STREAM_VIDEO_START, 5);
-    start.localVideoAsBwKbps = 500;
-    start.extmapId = 3;
-    start.extmapUri = "urn:3gpp:video-orientation";
-    EXPECT_EQ(5, boundStream(send(streamRecord(start))));  // the stream's reply goes back
+    // The stream's reply goes back; what the dump shows of it is DumpTest's part.
+    EXPECT_EQ(5, boundStream(send(_VTSP_CMD_STREAM_VIDEO_START, 5)));
     EXPECT_EQ((V{"parse: keep new stream, streamId 5"}), decisions());
     EXPECT_EQ(1u, dispatcher->streamCount());
-    ASSERT_TRUE(dispatcher->snapshot(5));
-    const StreamSnapshot s = dispatcher->snapshot(5).value();
-    EXPECT_EQ((std::vector<int64_t>{5, 1, StreamInfoMvd::STREAM_SENDRECV, 6010, 5010, 96, 600000, 100000, 512000,
-                                    0xD0, 3, 1}),
-              (std::vector<int64_t>{s.streamId, s.mvdStreamId, s.stat, s.localPort, s.remotePort, s.payloadType,
-                                    s.rate.bitrate, s.rate.minBitrate, s.rate.maxBitrate, s.rtcpMask, s.orientationExtId,
-                                    s.procStartCnt}));
-    EXPECT_EQ((V{"10.0.0.1", "192.168.1.2", kFront, "Remote"}), (V{s.localIp, s.remoteIp, s.captureId, s.renderId}));
 
     EXPECT_EQ(nullptr, send(_VTSP_CMD_STREAM_VIDEO_MODITY, 5, VTSP_STREAM_DIR_SENDONLY));
     EXPECT_EQ((V{"exsited stream, streamId 5"}), decisions());
@@ -268,15 +257,9 @@ TEST_F(CmdCallbackMvdTest, RenderNameAndReplacedImageFanOutInIdOrder) {
     EXPECT_THAT(hostfakes::callTexts(), Contains("Mvd_SetUniqueName(1, \"Remote\") = 0"));
     EXPECT_THAT(hostfakes::callTexts(), Not(Contains(HasSubstr("RemoteView"))));
 
-    // The send-only stream 3 (engine stream 2) only stores the name.
+    // By stream id: 3 (engine stream 2, send-only, only stores the name), 5 (3), 8 (1).
     EXPECT_EQ((V{"Mvd_SetUniqueName(3, \"RemoteView\") = 0", "Mvd_SetUniqueName(1, \"RemoteView\") = 0"}),
               callsOf([&] { dispatcher->setRenderId("RemoteView"); }));
-    EXPECT_STREQ("RemoteView", dispatcher->snapshot(3)->renderId);
-    V order;  // by stream id, with their engine streams
-    for (const StreamSnapshot& s : dispatcher->snapshots()) {
-        order.push_back(std::to_string(s.streamId) + "/" + std::to_string(s.mvdStreamId));
-    }
-    EXPECT_EQ((V{"3/2", "5/3", "8/1"}), order);
     EXPECT_EQ(V{}, callsOf([&] { dispatcher->setRenderId(nullptr); }));
 
     log.clear();

@@ -158,8 +158,6 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
                  "D commandModifyHandler: Mvd_ProcStart(1), ret 0, cnt 1",
                  "D commandModifyHandler: Mvd_CaptureAttach(), streamId 1, ret 0"}),
               lines());
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
-    EXPECT_EQ(kVtspId, stream->mStreamId);
     EXPECT_EQ(kBind, bindText(reply));  // the local end, in host order until the link sends it
 
     // A second start gives the running engine stream back before opening
@@ -168,7 +166,6 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
               run(start(VTSP_STREAM_DIR_SENDRECV)));
     EXPECT_EQ(kBind, bindText(reply));
     EXPECT_EQ(std::vector<unsigned>{2}, hostfakes::openMvdStreams());
-    EXPECT_EQ(1, stream->mProcStartCnt);
 }
 
 TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
@@ -248,8 +245,6 @@ TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
               run(command(_VTSP_CMD_STREAM_VIDEO_START, VTSP_STREAM_DIR_SENDRECV, 0)));
     EXPECT_EQ(kBind, bindText(reply));
     EXPECT_THAT(lines(), Contains("D remote \\0[0]"));
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
-    EXPECT_EQ(0, stream->mProcStartCnt);
 
     // Processing starts only once the remote is known. The stream was
     // already active, so the first codec set suspends the
@@ -270,7 +265,6 @@ TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
     EXPECT_EQ(then(then({"Mvd_SetRmtAddr(1, \"192.168.1.2\", 5002) = 0"}, kQuiet), {"Mvd_ResumeAllStrm() = 0"}),
               run(command(_VTSP_CMD_STREAM_VIDEO_MODITY, VTSP_STREAM_DIR_SENDRECV, 5002, "192.168.1.99")));
     EXPECT_THAT(lines(), Contains("D socketRemoteParamConfig: Port changed, Mvd_SetRmtAddr,port: 5002, ret 0"));
-    EXPECT_FALSE(stream->mParamChanged);
 
     // IPv6 ends, in either type value, are passed as eight full groups.
     auto v6 = makeStream();
@@ -325,7 +319,6 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_EQ(reachedTheCodec, run(other));
     EXPECT_EQ(kBind, bindText(reply));
     EXPECT_THAT(lines(), Contains("D codec type 1 is not supported "));
-    EXPECT_EQ(0, stream->mProcStartCnt);
 
     // A codec that cannot be read is left alone and the stream still runs.
     stream = makeStream();
@@ -346,8 +339,6 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_THAT(calls, Contains("Mvd_ArsSetParm(1, 100000, 960000, 20, 30) = 0"));
     EXPECT_EQ(kBind, bindText(reply));
     EXPECT_EQ("E codecParamConfig: SetCodec failed !!!", lines().back());
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
-    EXPECT_EQ(0, stream->mProcStartCnt);
 
     // Refused on a running stream, after every engine stream was suspended
     // for it: they go on with the codec they had.
@@ -408,9 +399,6 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
                  "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
                  "D rtcpParamConfig: Mvd_TptEnableFir(), ret 0"}),
               lines());
-    EXPECT_EQ(0x10, stream->mRTCPEnableMask);
-    EXPECT_EQ(StreamInfoMvd::STREAM_SENDRECV, stream->mStat);
-    EXPECT_FALSE(stream->mParamChanged);
 
     // The same mask again changes nothing; a disabled template is ignored.
     for (int16_t on : {1, 2, -1}) {
@@ -419,7 +407,6 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
     }
     EXPECT_THAT(lines(), Contains("D rtcpParamConfig Recive RTCP mask, templCode: 23, "
                                   "data[0]: -1, data[2]: 128, mRTCPEnableMask: 16"));
-    EXPECT_EQ(0x10, stream->mRTCPEnableMask);
 
     // The suspend was lifted by the configuration itself: the next modify
     // has nothing to resume.
@@ -431,9 +418,6 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
     EXPECT_EQ((V{"Mvd_RedSetEnable(1, 0) = 0", "Mvd_TptEnableTmmbr(1, 1) = 0", "Mvd_TptEnableNack(1, 1) = 0",
                  "Mvd_TptEnableFir(1, 1) = 0"}),
               run(rtcpMask(1, -1)));
-    EXPECT_EQ(0xD0, stream->mRTCPEnableMask);
-    EXPECT_FALSE(stream->mParamChanged);
-    EXPECT_EQ(StreamInfoMvd::STREAM_INACTIVE, stream->mStat);
 }
 
 TEST_F(StreamInfoMvdTest, SetCodecParamReplacesTheCodecAroundASuspendWhenActive) {
@@ -541,31 +525,11 @@ TEST_F(StreamInfoMvdTest, ReplacedImageNeedsAnEngineStream) {
               lines());
 }
 
-TEST_F(StreamInfoMvdTest, EndStopsWhatRunsAndDestructionClosesTheEngineStream) {
-    // Destroyed while running: the engine stream is closed.
-    startRunning();
-    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), callsOf([&] { stream.reset(); }));
-    EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(1), stat 3"}), lines());
-
-    // Never opened: nothing to stop or close.
-    stream = makeStream();
-    EXPECT_EQ(V{}, run(end(VTSP_STREAM_DIR_SENDRECV)));
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_END"}), lines());
-    EXPECT_FALSE(stream->isAlive());
-    EXPECT_EQ(V{}, callsOf([&] { stream.reset(); }));
-
-    // Running: the camera is detached and processing stops; closing is left
-    // to destruction.
-    stream = makeStream();
-    run(start(VTSP_STREAM_DIR_SENDRECV));
-    EXPECT_EQ((V{"Mvd_CaptureDetach(2) = 0", "Mvd_ProcStop(2) = 0"}), run(end(VTSP_STREAM_DIR_SENDRECV)));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
-    EXPECT_EQ((V{"Mvd_Close(2) = 0"}), callsOf([&] { stream.reset(); }));
-    EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(2), stat 0"}), lines());
-
-    // Held: processing has already stopped, only the camera is detached.
-    stream = makeStream();
+// Ending a running stream, one never opened, and closing at destruction:
+// CmdCallbackMvdTest, through the dispatcher that drops ended streams.
+TEST_F(StreamInfoMvdTest, EndingAHeldStreamOnlyDetachesTheCamera) {
     run(start(_VTSP_STREAM_DIR_INACTIVE));
-    EXPECT_EQ((V{"Mvd_CaptureDetach(3) = 0"}), run(end(_VTSP_STREAM_DIR_INACTIVE)));
+    EXPECT_EQ((V{"Mvd_CaptureDetach(1) = 0"}), run(end(_VTSP_STREAM_DIR_INACTIVE)));
+    EXPECT_EQ((V{"Mvd_Close(1) = 0"}), callsOf([&] { stream.reset(); }));
+    EXPECT_EQ((V{"I ~StreamInfoMvd: Mvd_Close(1), stat 0"}), lines());
 }
