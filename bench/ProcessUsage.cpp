@@ -57,6 +57,48 @@ double machineBusySeconds() {
     return static_cast<double>(user + nice + system + irq + softirq + steal) / static_cast<double>(sysconf(_SC_CLK_TCK));
 }
 
+namespace {
+
+// The kernel marks its own threads with PF_KTHREAD in the flags of
+// /proc/PID/stat.
+constexpr unsigned long kKernelThreadFlag = 0x00200000;
+
+// utime + stime of a kernel thread, in clock ticks; 0 for any other process.
+long long kernelThreadTicks(const std::string& pid) {
+    const std::string stat = firstLine("/proc/" + pid + "/stat");
+    // The name in parentheses may hold spaces: fields are counted after it.
+    const size_t close = stat.rfind(')');
+    if (close == std::string::npos) return 0;
+    std::istringstream in(stat.substr(close + 1));
+    std::string field;
+    unsigned long flags = 0;
+    long long utime = 0, stime = 0;
+    // Fields 3..8 (state .. tty_nr, tpgid), 9 flags, 10..13 fault counters, 14 utime, 15 stime.
+    for (int i = 3; i <= 8; ++i) in >> field;
+    in >> flags;
+    for (int i = 10; i <= 13; ++i) in >> field;
+    in >> utime >> stime;
+    return (flags & kKernelThreadFlag) != 0 ? utime + stime : 0;
+}
+
+}  // namespace
+
+double kernelWorkSeconds() {
+    std::istringstream in(firstLine("/proc/stat"));
+    std::string cpu;
+    long long user = 0, nice = 0, system = 0, idle = 0, iowait = 0, irq = 0, softirq = 0;
+    in >> cpu >> user >> nice >> system >> idle >> iowait >> irq >> softirq;
+    long long ticks = irq + softirq;
+    if (DIR* dir = opendir("/proc")) {
+        while (const dirent* entry = readdir(dir)) {
+            if (entry->d_name[0] < '0' || entry->d_name[0] > '9') continue;
+            ticks += kernelThreadTicks(entry->d_name);
+        }
+        closedir(dir);
+    }
+    return static_cast<double>(ticks) / static_cast<double>(sysconf(_SC_CLK_TCK));
+}
+
 unsigned cpuCount() {
     const long n = sysconf(_SC_NPROCESSORS_ONLN);
     return n > 0 ? static_cast<unsigned>(n) : 1;

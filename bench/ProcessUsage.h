@@ -23,6 +23,9 @@ long long processCpuNs();
 // CPU time every CPU of the machine spent busy so far (all processes, the
 // hypervisor's steal included), in seconds, and the number of CPUs.
 double machineBusySeconds();
+// Of that, the time spent in interrupts and in kernel threads (the kernel's
+// own workers, which move the pseudo-terminal's bytes for this process too).
+double kernelWorkSeconds();
 unsigned cpuCount();
 
 struct ThreadUsage {

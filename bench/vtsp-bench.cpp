@@ -15,6 +15,7 @@
 // then says "noisy" instead of judging.
 #include <android/log.h>
 #include <fcntl.h>
+#include <malloc.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -367,16 +368,25 @@ struct FloorSeries {
 class MachineLoad {
 public:
     MachineLoad()
-            : mBusy(processusage::machineBusySeconds()), mOwnNs(processusage::processCpuNs()), mStart(Clock::now()) {}
+            : mBusy(processusage::machineBusySeconds()),
+              mKernel(processusage::kernelWorkSeconds()),
+              mOwnNs(processusage::processCpuNs()),
+              mStart(Clock::now()) {}
+    // Other processes' share of the machine. The kernel's workers and
+    // interrupts are left out: most of their time here is the pipe's own
+    // traffic, which floor and link pay alike.
     double otherShare() const {
         const double busy = processusage::machineBusySeconds() - mBusy;
+        const double kernel = processusage::kernelWorkSeconds() - mKernel;
         const double own = static_cast<double>(processusage::processCpuNs() - mOwnNs) / 1e9;
         const double capacity = secondsSince(mStart) * processusage::cpuCount();
-        return capacity <= 0 || busy <= own ? 0 : (busy - own) / capacity;
+        const double other = busy - kernel - own;
+        return capacity <= 0 || other <= 0 ? 0 : other / capacity;
     }
 
 private:
     double mBusy;
+    double mKernel;
     long long mOwnNs;
     Clock::time_point mStart;
 };
@@ -537,6 +547,9 @@ FloodFigures measureFlood(ModemPty& pty, const Options& o) {
         android::VtspManager& link = scoped.link();
         const int master = pty.masterFd();
         sDumped = 0;
+        // Memory the earlier phases freed but the allocator kept would count
+        // as the flood's: hand it back first.
+        malloc_trim(0);
         const auto sample = [&f](size_t commands) {
             f.samples.push_back({commands, processusage::residentBytes(), processusage::heapInUse()});
         };
@@ -797,7 +810,7 @@ int main(int argc, char** argv) {
     printf("vtsp-bench: %d repetitions of %zu round trips and %zu throughput records each, "
            "3664-byte records, pseudo-terminal in raw mode\n",
            o.repeats, o.latencyRounds, o.throughputRecords);
-    printf("machine: %u CPUs; other work took %.0f%% of them during the repetitions; floor p50 spread %.0f%% "
+    printf("machine: %u CPUs; other processes took %.0f%% of them during the repetitions; floor p50 spread %.0f%% "
            "-> %s\n\n",
            processusage::cpuCount(), 100 * otherShare, 100 * floor.p50.relativeSpread(),
            noisy ? "NOISY: latency and rate verdicts withheld" : "quiet enough to judge");

@@ -35,7 +35,7 @@ CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
     const VtspCommand& c = cmd.command();
     const uint32_t streamId = commandStreamId(c);
     std::lock_guard<std::mutex> lock(mMutex);
-    PublishOnExit publish{*this};
+    PublishOnExit publish{*this, streamId};
 
     switch (c.code) {
         case _VTSP_CMD_STREAM_VIDEO_START:
@@ -74,27 +74,27 @@ CmdBuffer* CmdCallbackMvd::parse(const CmdBuffer& cmd) {
 
 void CmdCallbackMvd::setCaptureId(const char* id) {
     std::lock_guard<std::mutex> lock(mMutex);
-    PublishOnExit publish{*this};
+    PublishOnExit publish{*this, std::nullopt};
     if (id != nullptr) mCaptureId = id;
     forEachStream([id](StreamInfoMvd& s) { s.setCaptureId(id); });
 }
 
 void CmdCallbackMvd::setRenderId(const char* id) {
     std::lock_guard<std::mutex> lock(mMutex);
-    PublishOnExit publish{*this};
+    PublishOnExit publish{*this, std::nullopt};
     forEachStream([id](StreamInfoMvd& s) { s.setRenderId(id); });
 }
 
 void CmdCallbackMvd::setCodecParam(CameraCodecParameter::CameraConfigEnum config) {
     std::lock_guard<std::mutex> lock(mMutex);
-    PublishOnExit publish{*this};
+    PublishOnExit publish{*this, std::nullopt};
     mCameraConfig = config;
     forEachStream([config](StreamInfoMvd& s) { s.setCodecParam(config); });
 }
 
 void CmdCallbackMvd::sendReplacedImage(bool start, const char* path) {
     std::lock_guard<std::mutex> lock(mMutex);
-    PublishOnExit publish{*this};
+    PublishOnExit publish{*this, std::nullopt};
     forEachStream([start, path](StreamInfoMvd& s) { s.sendReplacedImage(start, path); });
 }
 
@@ -123,17 +123,31 @@ CameraCodecParameter::CameraConfigEnum CmdCallbackMvd::cameraConfig() {
     return mCameraConfig;
 }
 
+void CmdCallbackMvd::publishStream(uint32_t streamId) {
+    const auto it = mStreams.find(streamId);
+    std::optional<StreamSnapshot> stream;
+    if (it != mStreams.end()) stream = it->second->snapshot();
+    std::lock_guard<std::mutex> lock(mPublishedLock);
+    if (stream) {
+        mPublished.insert_or_assign(streamId, *stream);
+    } else {
+        mPublished.erase(streamId);
+    }
+}
+
 void CmdCallbackMvd::publishStreams() {
-    std::vector<StreamSnapshot> streams;
-    streams.reserve(mStreams.size());
-    for (const auto& entry : mStreams) streams.push_back(entry.second->snapshot());
+    std::map<uint32_t, StreamSnapshot> streams;
+    for (const auto& entry : mStreams) streams.emplace(entry.first, entry.second->snapshot());
     std::lock_guard<std::mutex> lock(mPublishedLock);
     mPublished.swap(streams);
 }
 
 std::vector<StreamSnapshot> CmdCallbackMvd::publishedStreams() const {
     std::lock_guard<std::mutex> lock(mPublishedLock);
-    return mPublished;
+    std::vector<StreamSnapshot> out;
+    out.reserve(mPublished.size());
+    for (const auto& entry : mPublished) out.push_back(entry.second);
+    return out;
 }
 
 const char* CmdCallbackMvd::captureId() {

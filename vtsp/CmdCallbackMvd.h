@@ -49,11 +49,16 @@ public:
     std::vector<StreamSnapshot> publishedStreams() const;
 
 private:
-    // Declared after the dispatcher's lock is taken: publishes on every way out.
+    // Declared after the dispatcher's lock is taken: publishes on every way
+    // out. A command changes only its own stream, and copying every stream
+    // after each command would make the handling thread's cost grow with the
+    // number of streams.
     struct PublishOnExit {
         CmdCallbackMvd& dispatcher;
-        ~PublishOnExit() { dispatcher.publishStreams(); }
+        std::optional<uint32_t> onlyStream;  // empty: every stream may have changed
+        ~PublishOnExit() { onlyStream ? dispatcher.publishStream(*onlyStream) : dispatcher.publishStreams(); }
     };
+    void publishStream(uint32_t streamId);
     void publishStreams();
 
     template <typename Fn>
@@ -65,7 +70,7 @@ private:
     const char* mCaptureId;
     std::mutex mMutex;
     mutable std::mutex mPublishedLock;
-    std::vector<StreamSnapshot> mPublished;
+    std::map<uint32_t, StreamSnapshot> mPublished;
 };
 
 }  // namespace android

@@ -124,15 +124,28 @@ TEST_F(DumpTest, SectionsFollowACallThroughStartModifyEndAndRelease) {
     modified[5] = "    remote: 192.168.1.2:5002";
     EXPECT_EQ(modified, section(dump({"--streams"}), "streams:"));
 
+    // A second stream's commands leave the first one's entry as it was.
     enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_END, 7, VTSP_STREAM_DIR_SENDRECV, 5002)));
+            streamCommand(_VTSP_CMD_STREAM_VIDEO_START, 8, VTSP_STREAM_DIR_SENDRECV, 5004)));
+    ASSERT_TRUE(enginetest::modem().readRecord(&bind));
     handled(3);
+    const Strings two = section(dump({"--streams"}), "streams:");
+    ASSERT_EQ(2 * modified.size() - 1, two.size());
+    EXPECT_EQ("streams: 2", two[0]);
+    EXPECT_EQ(Strings(modified.begin() + 1, modified.end()), Strings(two.begin() + 1, two.begin() + modified.size()));
+    EXPECT_EQ("  stream 8:", two[modified.size()]);
+
+    for (uint32_t id : {8u, 7u}) {
+        enginetest::modem().writeRecord(vtspcodec::streamRecord(
+                streamCommand(_VTSP_CMD_STREAM_VIDEO_END, id, VTSP_STREAM_DIR_SENDRECV, 5002)));
+    }
+    handled(5);
     EXPECT_EQ((Strings{"streams: 0"}), section(dump({"--streams"}), "streams:"));
     const Strings history = section(dump({"--history"}), "recent commands:");
-    ASSERT_EQ(4u, history.size());
+    ASSERT_EQ(6u, history.size());
     EXPECT_THAT(history[1], ::testing::MatchesRegex("  #1 [0-9]+\\.[0-9]{3} s START 81, stream 7 -> bind 10\\.0\\.0\\.1:6000"));
     EXPECT_THAT(history[2], ::testing::MatchesRegex("  #2 [0-9]+\\.[0-9]{3} s MODIFY 82, stream 7 -> none"));
-    EXPECT_THAT(history[3], ::testing::MatchesRegex("  #3 [0-9]+\\.[0-9]{3} s END 88, stream 7 -> none"));
+    EXPECT_THAT(history[5], ::testing::MatchesRegex("  #5 [0-9]+\\.[0-9]{3} s END 88, stream 7 -> none"));
 
     send(kRelease);
     settleRemovals();
