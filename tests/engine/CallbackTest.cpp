@@ -170,25 +170,6 @@ TEST_F(CallbackTest, CleanCallbackUnlinksAndClearsWithoutEndingTheCall) {
     EXPECT_EQ(Strings{"Remote"}, hostfakes::activeRenders());
 }
 
-TEST_F(CallbackTest, ADeadCallbackDoesNotBlockNotifications) {
-    sp<RemoteBinder> client = enginetest::remoteCallback();
-    ASSERT_TRUE(client->kill());
-    // Set after its process died: the death link cannot be made.
-    setCallback(client);
-    EXPECT_EQ(0u, client->deathRecipientCount());
-
-    mark();
-    auto notified = std::async(std::launch::async, [] {
-        mmeEvent(kRtpBreak);
-        remoteVideoSize();
-    });
-    ASSERT_EQ(std::future_status::ready, notified.wait_for(10s));
-    EXPECT_EQ(1u, count(kEngineTag, "BpVideoCallEngineCallback notifyCallback, 14"));
-    EXPECT_EQ(1u, count(kEngineTag, kSizeSent));
-    EXPECT_EQ(0u, client->transactionCount());
-    EXPECT_EQ(Strings{}, linesOf(kServiceTag));
-}
-
 TEST_F(CallbackTest, ACallbackChangeWaitsForTheNotificationInProgress) {
     // The order of what the client's thread and this one see.
     std::mutex lock;

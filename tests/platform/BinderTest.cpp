@@ -1,7 +1,6 @@
 // Where the system meets the binder stand-in, it must answer as a device
 // does: a local binder's transact, its refusal of death links, the dump
-// transaction with the caller's identity, and the service manager's
-// replacement of a name.
+// transaction with the caller's identity.
 #include <binder/Binder.h>
 #include <binder/IPCThreadState.h>
 #include <binder/IServiceManager.h>
@@ -91,20 +90,4 @@ TEST(BBinder, DumpTransactionReachesDumpWithTheCallersIdentity) {
     EXPECT_EQ("0: " + self + " granted", dumpOf(binder, {}));
     // A BBinder that does not dump writes nothing.
     EXPECT_EQ("0: ", dumpOf(new BBinder(), {"-a"}));
-}
-
-TEST(ServiceManager, AddingANameAgainReplacesAndReleasesTheFirstService) {
-    sp<IServiceManager> sm = defaultServiceManager();
-    const String16 name("sm.test.replace");
-    EXPECT_EQ(nullptr, sm->checkService(name));
-    sp<IBinder> first = new BBinder();
-    const wp<IBinder> weakFirst = first;
-    ASSERT_EQ(NO_ERROR, sm->addService(name, first));
-    first.clear();
-    EXPECT_NE(nullptr, weakFirst.promote());  // the manager keeps it alive...
-    sp<IBinder> second = new BBinder();
-    ASSERT_EQ(NO_ERROR, sm->addService(name, second));
-    EXPECT_EQ(nullptr, weakFirst.promote());  // ...until it is replaced
-    EXPECT_EQ(second, sm->checkService(name));
-    EXPECT_EQ(BAD_VALUE, sm->addService(String16("sm.test.null"), nullptr));
 }

@@ -13,13 +13,6 @@ using namespace android;
 
 namespace {
 
-// Writes a binder that only the parcel holds; the weak pointer tells whether it lives.
-wp<IBinder> writeFreshBinder(Parcel* p) {
-    sp<IBinder> binder = new BBinder();
-    p->writeStrongBinder(binder);
-    return binder;
-}
-
 void setBytes(Parcel* p, const std::vector<char>& bytes) {
     p->setData(reinterpret_cast<const uint8_t*>(bytes.data()), bytes.size());
 }
@@ -71,38 +64,12 @@ TEST(Parcel, CStringsArePaddedWithZerosToWholeWordsAndNeedATerminator) {
     EXPECT_EQ(9, p.readInt32());
     EXPECT_EQ(BAD_VALUE, p.writeCString(nullptr));
 
-    // Padding is zeroed even over bytes written before.
-    Parcel over;
-    over.writeInt64(-1);
-    over.setDataPosition(0);
-    over.writeCString("hello");
-    EXPECT_EQ(0, memcmp(hello, over.data(), sizeof(hello)));
-
     setBytes(&p, {'a', 'b', 'c', 'd', 'e', 'f', 'g', 'h'});
     EXPECT_EQ(nullptr, p.readCString());
     EXPECT_EQ(0u, p.dataPosition());
     setBytes(&p, {'x', 'y', 0});  // the terminator may be the last byte of unpadded data
     EXPECT_STREQ("xy", p.readCString());
     EXPECT_EQ(0u, p.dataAvail());
-}
-
-TEST(Parcel, StrongBinderRoundTripsAndIsKeptAliveByTheParcel) {
-    wp<IBinder> weak;
-    {
-        Parcel p;
-        p.writeInt32(1);
-        weak = writeFreshBinder(&p);
-        EXPECT_EQ(1u, p.objectsCount());
-        EXPECT_EQ(4u + 24u, p.dataSize());
-        p.writeInt32(2);
-
-        p.setDataPosition(0);
-        EXPECT_EQ(1, p.readInt32());
-        ASSERT_NE(nullptr, weak.promote());
-        EXPECT_EQ(weak.promote(), p.readStrongBinder());
-        EXPECT_EQ(2, p.readInt32());
-    }
-    EXPECT_EQ(nullptr, weak.promote());
 }
 
 TEST(Parcel, ANullBinderIsARecordThatReadsAsNull) {

@@ -62,18 +62,3 @@ TEST(ModemActorPipe, StepsGoInAndRecordsComeBackInPieces) {
     EXPECT_EQ(2u, timeline.all().size());
 }
 
-TEST(LogTapLines, TakesEveryPriorityWhileItLives) {
-    Timeline timeline;
-    {
-        LogTap tap(&timeline);
-        __android_log_print(ANDROID_LOG_DEBUG, "VTSPManager", "recv msg %d", 1);
-        __android_log_print(ANDROID_LOG_ERROR, "CmdclbMVD", "failed");
-        EXPECT_EQ((std::vector<std::string>{"D VTSPManager: recv msg 1", "E CmdclbMVD: failed"}), tap.linesSince(0));
-        EXPECT_EQ((std::vector<std::string>{"E CmdclbMVD: failed"}), tap.linesSince(1));
-        EXPECT_EQ(2u, tap.lineCount());
-    }
-    __android_log_print(ANDROID_LOG_INFO, "VTSPManager", "after the tap");
-    const std::vector<TimelineEntry> entries = timeline.all();
-    ASSERT_EQ(2u, entries.size());  // not the line after the tap
-    EXPECT_EQ(TimelineEntry::Kind::kLog, entries[0].kind);
-}

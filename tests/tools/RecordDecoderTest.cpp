@@ -100,19 +100,6 @@ TEST(RecordDecoderStream, TrailingBytesAreExplainedAndShown) {
                                                 "of 3664): 07 07 07 07 07 07 07 07 07 07\n"));
 }
 
-TEST(RecordDecoderStream, StepsOutputIsOneStepPerRecord) {
-    // That each step builds its record again is checked by StepSyntaxText.
-    const VPR_Comm records[] = {recordOf("start stream=1 local=[::1]:6000 remote=10.1.1.1:5000 ext=2"),
-                                recordOf("config stream=1 rtcp=0x10"), recordOf("raw target=8 type=1")};
-    std::istringstream in(std::string(reinterpret_cast<const char*>(records), sizeof(records)));
-    std::ostringstream out;
-    RecordDecoder::decodeStream(in, out, true);
-    EXPECT_EQ("start stream=1 dir=sendrecv local=[::1]:6000 remote=10.1.1.1:5000 ext=2\n"
-              "config stream=1 rtcp=0x10\n"
-              "raw target=8 type=1 code=0\n",
-              out.str());
-}
-
 TEST(RecordDecoderStream, ArbitraryBytesDecodeWithoutFault) {
     std::mt19937 random(99);
     for (int i = 0; i < 300; ++i) {

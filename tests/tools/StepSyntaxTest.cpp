@@ -120,36 +120,20 @@ TEST(StepSyntaxErrors, NameWhatWasExpectedAndWhatWasFound) {
     const std::pair<std::string, std::string> cases[] = {
             {"", "expected a step (start, modify, end, config, raw) but found end of line"},
             {"stop stream=1", "expected a step (start, modify, end, config, raw) but found 'stop'"},
-            {"st\x01p", "expected a step (start, modify, end, config, raw) but found 'st?p'"},
             {"start", "expected stream=N (0..4294967295) but found end of line"},
             {"start stream=-1", "expected stream=N (0..4294967295) but found 'stream=-1'"},
-            {"start stream=0x", "expected stream=N (0..4294967295) but found 'stream=0x'"},
-            {"start stream=1.5", "expected stream=N (0..4294967295) but found 'stream=1.5'"},
             {"start stream=99999999999999999999", "expected stream=N (0..4294967295) but found 'stream=99999999999999999999'"},
             {"start stream=1 dir=sideways", "expected dir=ended|inactive|sendonly|recvonly|sendrecv or a number but "
                                             "found 'dir=sideways'"},
             {"start stream=1 local=10.0.0.1:70000", "expected local=IP:PORT but found 'local=10.0.0.1:70000'"},
-            {"start stream=1 remote=[::1]6000", "expected remote=IP:PORT but found 'remote=[::1]6000'"},
             {"start stream=1 stream=2", "expected stream= only once but found 'stream=2'"},
             {"start stream=1 rtcp=3", "expected a field of start (stream=, dir=, local=, remote=, pt=, encoder=, bw=, "
                                       "rbw=, ext=, rtcp-ports=, type=) but found 'rtcp=3'"},
             {"config stream=1", "expected rtcp=MASK (0..0xffff) but found end of line"},
             {"config stream=40000 rtcp=1", "expected stream=N (-32768..32767) but found 'stream=40000'"},
-            {"config stream=-0x8001 rtcp=1", "expected stream=N (-32768..32767) but found 'stream=-0x8001'"},
-            {"raw type=1", "expected target=N but found end of line"},
             {"start stream=1 ext=3:" + std::string(129, 'u'),
              "expected ext=ID or ID:URI (URI up to 128 characters) but found 'ext=3:uuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuuu...'"},
     };
     for (const auto& c : cases) EXPECT_EQ(c.second, errorOf(c.first)) << c.first;
 }
 
-TEST(StepSyntaxErrors, LinesAreNumberedAndCommentsSkipped) {
-    std::istringstream in("# a comment\nstart stream=1\n\n  end stream=1  # ends it\nmodify strem=1\n");
-    std::vector<StepSyntax::Step> steps;
-    std::string error;
-    EXPECT_FALSE(StepSyntax::parseLines(in, &steps, &error));
-    EXPECT_EQ("line 5: expected a field of modify (stream=, dir=, local=, remote=, pt=, encoder=, bw=, rbw=, ext=, "
-              "rtcp-ports=, type=) but found 'strem=1'",
-              error);
-    EXPECT_EQ(2u, steps.size());
-}
