@@ -1,12 +1,10 @@
-// The simulator's output: entries ordered between the platform calls they
-// happened between, the aligned text lines, and the mscgen chart.
+// The simulator's output: the aligned text lines and the mscgen chart (where
+// entries fall between the platform calls is SimulatorPlay's part).
 #include <gtest/gtest.h>
 
 #include <sstream>
 
 #include "MscWriter.h"
-#include "HostFakes.h"
-#include "Mvd.h"
 #include "Timeline.h"
 #include "TimelinePrinter.h"
 
@@ -28,20 +26,6 @@ TimelineEntry entry(Kind kind, const std::string& actor, const std::string& targ
 }
 
 }  // namespace
-
-TEST(TimelineOrder, EntriesFallBetweenTheCallsTheyHappenedBetween) {
-    Timeline timeline;
-    const size_t before = hostfakes::callCount();
-    timeline.add(entry(Kind::kStep, "modem", "link", "before"));
-    Mvd_ProcStart(1);  // a platform call, recorded by the stand-in
-    timeline.add(entry(Kind::kRecordOut, "link", "modem", "after"));
-    timeline.addCall(before, "media", "Mvd_ProcStart(1) = 0", "link", "media");
-    std::vector<std::string> texts;
-    for (const TimelineEntry& e : timeline.takeNew()) texts.push_back(e.text);
-    EXPECT_EQ((std::vector<std::string>{"before", "Mvd_ProcStart(1) = 0", "after"}), texts);
-    EXPECT_TRUE(timeline.takeNew().empty());
-    EXPECT_EQ(3u, timeline.all().size());
-}
 
 TEST(TimelineText, ColumnsAlignAndRepliesJoinTheirRequest) {
     EXPECT_EQ("    12 ms  modem   -> link    START stream 1",
