@@ -1,7 +1,8 @@
 // The blocking queue between the link's threads: refusal while not running,
-// FIFO order, waking and closing a waiting consumer, pausing with reset, a
-// producer waiting for room, and the references it holds on the commands
-// that pass through it.
+// FIFO order, waking and closing a waiting consumer, a producer waiting for
+// room, and the references it holds on the commands that pass through it.
+// Pausing, and a pause or shutdown that ends a wait for room, are seen from
+// the link's side in VtspManagerTest.
 #include <android/log.h>
 #include <gtest/gtest.h>
 #include <sys/syscall.h>
@@ -145,27 +146,7 @@ TEST(CmdLockQueue, PushWakesAWaitingConsumerAndDestroyReleasesItAndEveryLaterWai
     EXPECT_EQ(88, pop(queue));
 }
 
-TEST(CmdLockQueue, ResetDiscardsRefusesAndKeepsTheConsumerWaitingUntilRestarted) {
-    LogCapture log;
-    Queue queue;
-    queue.start();
-    std::weak_ptr<CmdBuffer> a = pushed(queue, 81);
-    ASSERT_FALSE(a.expired());
-    queue.reset();
-    EXPECT_TRUE(a.expired());
-
-    Consumer consumer(queue);
-    ASSERT_TRUE(consumer.sleeping());  // a stopped, empty queue makes its consumer wait
-    queue.pushAndSignal(command(88));
-    EXPECT_EQ(1u, refusals(log));
-    EXPECT_FALSE(consumer.returnedWithin(50ms));
-
-    queue.start();
-    queue.pushAndSignal(command(15));
-    EXPECT_EQ(15, consumer.result());  // nothing from before the reset survived
-}
-
-TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMarkOrAShutdown) {
+TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMark) {
     const auto waitForRoom = [](Queue& q) {
         q.waitForRoom(4, 2);
         return int32_t{0};
@@ -183,14 +164,4 @@ TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMarkOrAShutdo
     EXPECT_EQ(83, pop(queue));
     EXPECT_EQ(0, producer.result());
     EXPECT_EQ(4u, queue.peakSize());
-
-    // Pausing or closing the queue empties it, and so ends the wait too.
-    for (void (Queue::*shut)() : {&Queue::reset, &Queue::destroy}) {
-        queue.start();
-        while (queue.size() < 4) queue.pushAndSignal(command(85));
-        Consumer waiting(queue, waitForRoom);
-        ASSERT_TRUE(waiting.sleeping());
-        (queue.*shut)();
-        EXPECT_EQ(0, waiting.result());
-    }
 }

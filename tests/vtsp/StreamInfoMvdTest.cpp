@@ -150,17 +150,14 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
     EXPECT_EQ(startCalls(1), run(start(VTSP_STREAM_DIR_SENDRECV)));
     // A stream command read through the configuration view names no RTCP
     // template, so the initial mask stays and no feedback switch is touched.
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START",
-                 "D local 10.0.0.1\\6000[1]",
-                 "D <<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>",
-                 "D remote 192.168.1.2\\5000[1]",
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local 10.0.0.1\\6000[1]",
+                 "D <<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>", "D remote 192.168.1.2\\5000[1]",
                  "D socketRemoteParamConfig: Mvd_SetRmtAddr, ip:192.168.1.2, port: 5000, streamId 1, ret 0",
                  "D commandModifyHandler: Mvd_SetUniqueName(), streamId 1, renderid Remote, ret 0",
                  "D codecParamConfig: codec set payload 96, bitrate 600000, fps 30, 480 x 640, mCameraConfig 2",
                  "D rtcpParamConfig Recive RTCP mask, templCode: 5, data[0]: 4, data[2]: 0, mRTCPEnableMask: 208",
                  "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
-                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
-                 "D rtcpParamConfig: return",
+                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0", "D rtcpParamConfig: return",
                  "D commandModifyHandler: Mvd_ProcStart(1), ret 0, cnt 1",
                  "D commandModifyHandler: Mvd_CaptureAttach(), streamId 1, ret 0"}),
               lines());
@@ -381,14 +378,12 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
                  "Mvd_TptEnableNack(1, 1) = 0", "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
               run(rtcpMask(1, 0x30)));
     EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ((V{"D _VTSP_CMD_CONFIG",
-                 "D Recive RTCP mask 48",
+    EXPECT_EQ((V{"D _VTSP_CMD_CONFIG", "D Recive RTCP mask 48",
                  "D rtcpParamConfig Recive RTCP mask, templCode: 23, data[0]: 1, data[2]: 48, mRTCPEnableMask: 16",
                  "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
                  "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
                  "D rtcpParamConfig Mvd_SuspendAllStrm, rtcp params changed ",
-                 "D rtcpParamConfig: Mvd_TptEnableTmmbr(), ret 0",
-                 "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
+                 "D rtcpParamConfig: Mvd_TptEnableTmmbr(), ret 0", "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
                  "D rtcpParamConfig: Mvd_TptEnableFir(), ret 0"}),
               lines());
 
