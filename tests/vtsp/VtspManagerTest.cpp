@@ -330,21 +330,6 @@ TEST_F(VtspManagerTest, ReplyCutShortByDestroyIsFinishedFirstWhenTheLinkRunsAgai
                                                          std::string(pty.devicePath())));
 }
 
-// Threads inherit the signal mask of the thread that starts them.
-TEST_F(VtspManagerTest, LinkStartedWithSigusr1BlockedStillEnds) {
-    WatchedThreads watch(10s);
-    auto ended = watch.run([&] {
-        sigset_t set;
-        sigemptyset(&set);
-        sigaddset(&set, SIGUSR1);
-        pthread_sigmask(SIG_BLOCK, &set, nullptr);
-        startLink();
-        destroyLink();
-    });
-    EXPECT_TRUE(watch.finishes(ended));
-    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
-}
-
 TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirstAndANeverStartedOneWakesNone) {
     VtspManager closed(pty.devicePath());
     closed.destroy();
@@ -414,7 +399,7 @@ TEST_F(VtspManagerTest, StopAndDestroyEndAReceiverWaitingForRoom) {
     EXPECT_EQ(-1, link.mFd);
 }
 
-TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
+TEST_F(VtspManagerTest, WakeUpSignalNeitherEndsTheProcessRightAfterInitNorIsLostToABlockedMask) {
     // The wake-up signal's default action ends the process, so destroy must
     // not be able to send it before the link has set up its handler. Earlier
     // links in this process may have installed one already: start from the default.
@@ -430,6 +415,19 @@ TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
         destroyLink();
         ASSERT_EQ(-1, link.mFd);
     }
+
+    // Threads inherit the signal mask of the thread that starts them.
+    WatchedThreads watch(10s);
+    auto ended = watch.run([&] {
+        sigset_t set;
+        sigemptyset(&set);
+        sigaddset(&set, SIGUSR1);
+        pthread_sigmask(SIG_BLOCK, &set, nullptr);
+        startLink();
+        destroyLink();
+    });
+    EXPECT_TRUE(watch.finishes(ended));
+    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
 
 // A device that cannot be opened, or that is at its end, is a failed read
