@@ -99,6 +99,9 @@ StreamCommand startCommand(uint32_t streamId, const char* localIp = "10.0.0.1", 
     return c;
 }
 
+// The reply to a start of stream `id` from startCommand's local end.
+std::string bindOf(uint32_t id) { return kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000"; }
+
 std::string recvLine(int msg, int target) {
     return "cmdRxFunc, recv msg " + std::to_string(msg) + ", targetModule " + std::to_string(target);
 }
@@ -215,7 +218,7 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     pty.writeRecord(streamRecord(start), 1);
     // The reply goes out in wire order (read back here in host order); how
     // a body is turned and composed is CmdBufferTest's business.
-    EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
+    EXPECT_EQ(bindOf(7), readBind());
     EXPECT_EQ((V{recvLine(1, 0), kWritten}), linkLines());
     EXPECT_TRUE(called("Mvd_ProcStart(1) = 0"));
 
@@ -279,7 +282,7 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     EXPECT_EQ(2u, openDescriptorsOn(pty.devicePath()));
     // A round trip gives any extra thread time to announce itself.
     pty.writeRecord(streamRecord(startCommand(7)));
-    EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
+    EXPECT_EQ(bindOf(7), readBind());
     EXPECT_TRUE(linkThreads(1));
 
     // A closed modem end is logged (the kernel reports the hang-up as an
@@ -322,10 +325,8 @@ TEST_F(VtspManagerTest, ReplyCutShortByDestroyIsFinishedFirstWhenTheLinkRunsAgai
     pty.writeRecord(streamRecord(startCommand(kStarts + 1)));
     // Whole records only: every reply written before, the cut one completed,
     // then the new one.
-    for (size_t id = 1; id <= written; ++id) {
-        ASSERT_EQ(kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000", readBind());
-    }
-    EXPECT_EQ(kWholeBind + "stream " + std::to_string(kStarts + 1) + " at 10.0.0.1:6000", readBind());
+    for (size_t id = 1; id <= written; ++id) ASSERT_EQ(bindOf(id), readBind());
+    EXPECT_EQ(bindOf(kStarts + 1), readBind());
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, kTag, "writeToVpr: rest of the unfinished record written to " +
                                                          std::string(pty.devicePath())));
 }
@@ -365,9 +366,7 @@ TEST_F(VtspManagerTest, FloodWaitsAtTheHighWaterMarkAndIsHandledInOrder) {
     EXPECT_LT(written.load(), kFlood);  // the full pipe holds the modem's writes back
 
     hostfakes::releaseCalls();
-    for (uint32_t id = 1; id <= kFlood; ++id) {
-        ASSERT_EQ(kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000", readBind());
-    }
+    for (uint32_t id = 1; id <= kFlood; ++id) ASSERT_EQ(bindOf(id), readBind());
     EXPECT_EQ(high, link.mRxQueue.peakSize());
     EXPECT_EQ(kFlood, hostfakes::callCount("Mvd_Open"));
 }
