@@ -211,15 +211,28 @@ protected:
 
 }  // namespace
 
-TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
+TEST_F(VtspManagerTest, RecordsForOtherModulesAreDroppedAndAWholeCallGoesThrough) {
     startLink();
+    // Each of these carries a valid start: any of them reaching the handler
+    // would open a media engine stream and send a bind request.
+    const StreamCommand other = startCommand(9, "10.0.0.9", 6010);
+    pty.writeRecord(streamRecord(other, 0, VPMD_VPAD_TARGET));
+    pty.writeRecord(streamRecord(other, 0, VPMD_NET_TARGET));
+    pty.writeRecord(streamRecord(other, 0, 5));
+    pty.writeRecord(streamRecord(other, 3, VPMD_VIDEO_CMDEVT_TARGET));
     // The start arrives one byte a write and is still routed once.
     StreamCommand start = startCommand(7);
     pty.writeRecord(streamRecord(start), 1);
-    // The reply goes out in wire order (read back here in host order); how
-    // a body is turned and composed is CmdBufferTest's business.
+    // The queue keeps order, so this bind request proves that none of the
+    // first four was queued before it. It goes out in wire order (read back
+    // here in host order); how a body is turned and composed is
+    // CmdBufferTest's business.
     EXPECT_EQ(bindOf(7), readBind());
-    EXPECT_EQ((V{recvLine(1, 0), kWritten}), linkLines());
+    EXPECT_EQ((V{recvLine(1, 8), "cmdRxFunc, recv VPMD_VPAD_TARGET, modem is active", recvLine(2, 1),
+                 recvLine(3, 5), recvLine(4, 0), "cmdRxFunc, msg 4, VPMD_VIDEO_CMDEVT_TARGET, type 3",
+                 recvLine(5, 0), kWritten}),
+              linkLines());
+    for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
     EXPECT_TRUE(called("Mvd_ProcStart(1) = 0"));
 
     // Each later kind of command reaches the stream: RTCP feedback, a hold, the end.
@@ -236,27 +249,6 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     pty.writeRecord(streamRecord(start));
     EXPECT_TRUE(called("Mvd_Close(1) = 0"));
     EXPECT_TRUE(pty.silentFor(100ms));  // only the start had a reply
-}
-
-TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
-    startLink();
-    // Each of these carries a valid start: any of them reaching the handler
-    // would open a media engine stream and send a bind request.
-    const StreamCommand start = startCommand(7);
-    pty.writeRecord(streamRecord(start, 0, VPMD_VPAD_TARGET));
-    pty.writeRecord(streamRecord(start, 0, VPMD_NET_TARGET));
-    pty.writeRecord(streamRecord(start, 0, 5));
-    pty.writeRecord(streamRecord(start, 3, VPMD_VIDEO_CMDEVT_TARGET));
-    pty.writeRecord(streamRecord(startCommand(9, "10.0.0.9", 6010)));
-
-    // The queue keeps order, so the bind request of the fifth record proves
-    // that none of the first four was queued before it.
-    EXPECT_EQ(kWholeBind + "stream 9 at 10.0.0.9:6010", readBind());
-    EXPECT_EQ((V{recvLine(1, 8), "cmdRxFunc, recv VPMD_VPAD_TARGET, modem is active", recvLine(2, 1),
-                 recvLine(3, 5), recvLine(4, 0), "cmdRxFunc, msg 4, VPMD_VIDEO_CMDEVT_TARGET, type 3",
-                 recvLine(5, 0), kWritten}),
-              linkLines());
-    for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
     EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
 }
 
