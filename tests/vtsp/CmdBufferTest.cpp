@@ -45,9 +45,6 @@ TEST(CmdBuffer, TranslateSwapsOnlyPortsAndIpv6GroupsOfACommand) {
     const VPR_Comm wire = streamRecord(sampleStart());
     CmdBuffer cmd = bufferOf(wire);
     const VtspStmVideoView& v = cmd.command().u.stmVideo;
-    // On the wire the port 5000 is the bytes 0x13 0x88.
-    EXPECT_EQ(0x1388, cmd.getCmd()[216 + 20] << 8 | cmd.getCmd()[216 + 21]);
-
     cmd.translate(true);
     EXPECT_EQ((std::vector<int>{5000, 5001, 6000, 6001, 0xfe80, 1}),
               (std::vector<int>{v.remoteAddr.port, v.remoteControlPort, v.localAddr.port, v.localControlPort,
@@ -159,7 +156,6 @@ TEST(CmdBuffer, CopiesCarryTheBodyAndTheDestructorLogsBothCounts) {
     const int32_t con0 = CmdBuffer::con.load(), des0 = CmdBuffer::des.load();
     {
         CmdBuffer assigned;
-        EXPECT_EQ(0u, assigned.length);
         assigned = source;  // counts as a construction
         EXPECT_TRUE(same(source, assigned));
     }

@@ -1,7 +1,8 @@
 // The blocking queue between the link's threads: refusal while not running,
-// FIFO order, waking and closing a waiting consumer, pausing with reset, a
-// producer waiting for room, and the references it holds on the commands
-// that pass through it.
+// FIFO order, a producer waiting for room, and the references it holds on
+// the commands that pass through it. Waking and closing a waiting consumer,
+// restarting, pausing, and a pause or shutdown that ends a wait for room are
+// seen from the link's side in VtspManagerTest.
 #include <android/log.h>
 #include <gtest/gtest.h>
 #include <sys/syscall.h>
@@ -32,9 +33,6 @@ Elem command(int32_t code) {
     return std::make_shared<CmdBuffer>(VPR_COMM_VTSP_CMD, vtspcodec::commandRecord(code).body);
 }
 
-// The code of a popped element, -1 for none.
-int32_t codeOf(const Elem& e) { return e == nullptr ? -1 : e->command().code; }
-
 // Pushes a command and returns a handle that tells whether anyone still holds it.
 std::weak_ptr<CmdBuffer> pushed(Queue& queue, int32_t code) {
     Elem e = command(code);
@@ -54,17 +52,18 @@ char taskState(pid_t tid) {
     return paren == std::string::npos || paren + 2 >= text.size() ? '?' : text[paren + 2];
 }
 
+// The code of the popped command, -2 when waitAndPop answered false.
 int32_t pop(Queue& queue) {
     Elem elem;
-    return queue.waitAndPop(elem) ? codeOf(elem) : -2;
+    return queue.waitAndPop(elem) ? elem->command().code : -2;
 }
 
-// A thread blocked in waitAndPop (or in another wait given as `body`). Its
-// result is a future, so a test can tell "still waiting" from "returned"
-// without sleeping blindly.
-class Consumer {
+// A thread blocked in one of the queue's waits, given as `body`. Its result
+// is a future, so a test can tell "still waiting" from "returned" without
+// sleeping blindly.
+class Waiter {
 public:
-    explicit Consumer(Queue& queue, int32_t (*body)(Queue&) = pop) : mQueue(queue) {
+    Waiter(Queue& queue, int32_t (*body)(Queue&)) : mQueue(queue) {
         std::promise<pid_t> tid;
         std::future<pid_t> tidReady = tid.get_future();
         mResult = std::async(std::launch::async, [&queue, body, tid = std::move(tid)]() mutable {
@@ -73,28 +72,27 @@ public:
         });
         mTid = tidReady.get();
     }
-    // A test that failed half-way must not hang on a consumer still waiting;
+    // A test that failed half-way must not hang on a thread still waiting;
     // one that even a close cannot release ends the run at once.
-    ~Consumer() {
+    ~Waiter() {
         if (!mResult.valid() || returnedWithin(0ms)) return;
         mQueue.destroy();
         if (!returnedWithin(2s)) {
-            fprintf(stderr, "consumer still blocked in the queue after destroy\n");
+            fprintf(stderr, "thread still blocked in the queue after destroy\n");
             std::abort();
         }
     }
-    Consumer(const Consumer&) = delete;
-    Consumer& operator=(const Consumer&) = delete;
+    Waiter(const Waiter&) = delete;
+    Waiter& operator=(const Waiter&) = delete;
 
-    // True once the thread sleeps inside waitAndPop; a push or close that
-    // comes after this really has to wake it.
+    // True once the thread sleeps inside the wait; whatever comes after this
+    // really has to wake it.
     bool sleeping() const {
         return eventually([&] { return returnedWithin(0ms) || taskState(mTid) == 'S'; }) && !returnedWithin(0ms);
     }
     bool returnedWithin(std::chrono::milliseconds window) const {
         return mResult.wait_for(window) == std::future_status::ready;
     }
-    // The popped code, or -2 when waitAndPop answered false.
     int32_t result() { return returnedWithin(5s) ? mResult.get() : -3; }
 
 private:
@@ -105,98 +103,29 @@ private:
 
 }  // namespace
 
-TEST(CmdLockQueue, ClosedQueueRefusesPushesAndDoesNotWait) {
+TEST(CmdLockQueue, ClosedQueueRefusesAndDoesNotWaitARunningOneKeepsOrderAndDestroyReleases) {
     LogCapture log;
     Queue queue;
     Elem elem = command(81);
     queue.pushAndSignal(elem);  // never started
     EXPECT_EQ(1u, refusals(log));
     EXPECT_EQ(1, elem.use_count());  // the refused element is neither kept nor released
-    Elem out;
-    EXPECT_FALSE(queue.waitAndPop(out));  // closed: returns at once
-    EXPECT_EQ(nullptr, out);
+    EXPECT_EQ(-2, pop(queue));       // closed: returns at once
+
+    queue.start();
+    for (int32_t code : {81, 82, 88}) queue.pushAndSignal(command(code));
+    for (int32_t code : {81, 82, 88}) EXPECT_EQ(code, pop(queue));
+    EXPECT_EQ(1u, refusals(log));
 
     // Destroy releases what it held and delivers none of it.
-    queue.start();
-    std::weak_ptr<CmdBuffer> held[] = {pushed(queue, 81), pushed(queue, 82), pushed(queue, 88)};
+    std::weak_ptr<CmdBuffer> held[] = {pushed(queue, 81), pushed(queue, 82)};
     for (auto& w : held) ASSERT_FALSE(w.expired());
     queue.destroy();
     for (auto& w : held) EXPECT_TRUE(w.expired());
-    EXPECT_FALSE(queue.waitAndPop(out));
-    EXPECT_EQ(nullptr, out);
+    EXPECT_EQ(-2, pop(queue));
 }
 
-TEST(CmdLockQueue, ElementsLeaveInTheOrderTheyCame) {
-    LogCapture log;
-    Queue queue;
-    queue.start();
-    Elem first = command(81);
-    queue.pushAndSignal(first);
-    EXPECT_EQ(2, first.use_count());  // the queue holds its own reference
-    queue.pushAndSignal(command(82));
-    queue.pushAndSignal(command(88));
-    Elem out;
-    for (int32_t code : {81, 82, 88}) {
-        ASSERT_TRUE(queue.waitAndPop(out));
-        EXPECT_EQ(code, codeOf(out));
-    }
-    // Popping into an occupied element released its earlier command, and the
-    // queue kept no reference of its own.
-    EXPECT_EQ(1, first.use_count());
-    EXPECT_EQ(1, out.use_count());
-    EXPECT_EQ(0u, refusals(log));
-}
-
-TEST(CmdLockQueue, PushWakesAWaitingConsumerAndDestroyReleasesItAndEveryLaterWait) {
-    Queue queue;
-    queue.start();
-    Consumer woken(queue);
-    ASSERT_TRUE(woken.sleeping());
-    queue.pushAndSignal(command(82));
-    EXPECT_EQ(82, woken.result());
-
-    Consumer released(queue);
-    ASSERT_TRUE(released.sleeping());
-    queue.destroy();
-    EXPECT_EQ(-2, released.result());
-    Elem out = command(15);
-    EXPECT_FALSE(queue.waitAndPop(out));  // a hang here fails the test by its time limit
-    EXPECT_EQ(15, codeOf(out));           // the output is left as it was
-
-    // A closed queue can be started again.
-    queue.start();
-    queue.pushAndSignal(command(88));
-    ASSERT_TRUE(queue.waitAndPop(out));
-    EXPECT_EQ(88, codeOf(out));
-}
-
-TEST(CmdLockQueue, ResetDiscardsRefusesAndKeepsTheConsumerWaitingUntilRestarted) {
-    LogCapture log;
-    Queue queue;
-    queue.start();
-    std::weak_ptr<CmdBuffer> a = pushed(queue, 81), b = pushed(queue, 82);
-    ASSERT_FALSE(a.expired());
-    queue.reset();
-    EXPECT_TRUE(a.expired());
-    EXPECT_TRUE(b.expired());
-
-    Consumer consumer(queue);
-    ASSERT_TRUE(consumer.sleeping());  // a stopped, empty queue makes its consumer wait
-    queue.reset();                     // and resetting again does not wake it
-    EXPECT_FALSE(consumer.returnedWithin(50ms));
-
-    Elem refused = command(88);
-    queue.pushAndSignal(refused);
-    EXPECT_EQ(1u, refusals(log));
-    EXPECT_EQ(1, refused.use_count());
-    EXPECT_FALSE(consumer.returnedWithin(50ms));
-
-    queue.start();
-    queue.pushAndSignal(command(15));
-    EXPECT_EQ(15, consumer.result());  // nothing from before the reset survived
-}
-
-TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMarkOrAShutdown) {
+TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMark) {
     const auto waitForRoom = [](Queue& q) {
         q.waitForRoom(4, 2);
         return int32_t{0};
@@ -206,25 +135,12 @@ TEST(CmdLockQueue, ProducerWaitsForRoomFromTheHighMarkToBelowTheLowMarkOrAShutdo
     for (int32_t code : {81, 82, 83}) queue.pushAndSignal(command(code));
     EXPECT_EQ(0, waitForRoom(queue));  // below the high mark: returns at once
     queue.pushAndSignal(command(84));
-    Consumer producer(queue, waitForRoom);
+    Waiter producer(queue, waitForRoom);
     ASSERT_TRUE(producer.sleeping());
-    Elem out;
-    for (int32_t code : {81, 82}) {
-        ASSERT_TRUE(queue.waitAndPop(out));
-        EXPECT_EQ(code, codeOf(out));
-    }
+    EXPECT_EQ(81, pop(queue));
+    EXPECT_EQ(82, pop(queue));
     EXPECT_FALSE(producer.returnedWithin(50ms));  // two left: not below the low mark yet
-    ASSERT_TRUE(queue.waitAndPop(out));
+    EXPECT_EQ(83, pop(queue));
     EXPECT_EQ(0, producer.result());
     EXPECT_EQ(4u, queue.peakSize());
-
-    // Pausing or closing the queue empties it, and so ends the wait too.
-    for (void (Queue::*shut)() : {&Queue::reset, &Queue::destroy}) {
-        queue.start();
-        while (queue.size() < 4) queue.pushAndSignal(command(85));
-        Consumer waiting(queue, waitForRoom);
-        ASSERT_TRUE(waiting.sleeping());
-        (queue.*shut)();
-        EXPECT_EQ(0, waiting.result());
-    }
 }

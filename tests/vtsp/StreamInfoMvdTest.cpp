@@ -4,6 +4,7 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstring>
 #include <memory>
 #include <string>
@@ -117,6 +118,12 @@ protected:
     }
     V run(const StreamCommand& c, StreamInfoMvd* s = nullptr) { return run(streamRecord(c), s); }
 
+    // A new stream on a fresh engine, as if the test began again.
+    void fresh() {
+        stream = makeStream();
+        hostfakes::reset();
+    }
+
     // Starts the stream sending and receiving with its codec applied.
     void startRunning() {
         run(start(VTSP_STREAM_DIR_SENDRECV));
@@ -144,17 +151,14 @@ TEST_F(StreamInfoMvdTest, StartRunsEveryStepInOrderAndAsksTheModemToBind) {
     EXPECT_EQ(startCalls(1), run(start(VTSP_STREAM_DIR_SENDRECV)));
     // A stream command read through the configuration view names no RTCP
     // template, so the initial mask stays and no feedback switch is touched.
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START",
-                 "D local 10.0.0.1\\6000[1]",
-                 "D <<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>",
-                 "D remote 192.168.1.2\\5000[1]",
+    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local 10.0.0.1\\6000[1]",
+                 "D <<<<<<<<<<<<<<<<VTSP_STREAM_DIR_SENDRECV>>>>>>>>>>>>>>>>>", "D remote 192.168.1.2\\5000[1]",
                  "D socketRemoteParamConfig: Mvd_SetRmtAddr, ip:192.168.1.2, port: 5000, streamId 1, ret 0",
                  "D commandModifyHandler: Mvd_SetUniqueName(), streamId 1, renderid Remote, ret 0",
                  "D codecParamConfig: codec set payload 96, bitrate 600000, fps 30, 480 x 640, mCameraConfig 2",
                  "D rtcpParamConfig Recive RTCP mask, templCode: 5, data[0]: 4, data[2]: 0, mRTCPEnableMask: 208",
                  "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
-                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
-                 "D rtcpParamConfig: return",
+                 "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0", "D rtcpParamConfig: return",
                  "D commandModifyHandler: Mvd_ProcStart(1), ret 0, cnt 1",
                  "D commandModifyHandler: Mvd_CaptureAttach(), streamId 1, ret 0"}),
               lines());
@@ -210,13 +214,7 @@ TEST_F(StreamInfoMvdTest, DirectionChangesSwitchTransportAndProcessing) {
     }
 }
 
-TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillReplies) {
-    StreamCommand noLocal = start(VTSP_STREAM_DIR_SENDRECV);
-    noLocal.localAddr = noAddress();
-    EXPECT_EQ(V{}, run(noLocal));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ((V{"D _VTSP_CMD_STREAM_VIDEO_START", "D local \\0[0]"}), lines());
-
+TEST_F(StreamInfoMvdTest, WithoutALocalPortNothingHappensAndAFailedOpenStillReplies) {
     StreamCommand portZero = modify(VTSP_STREAM_DIR_SENDRECV);
     portZero.localAddr = address("10.0.0.1", 0);
     EXPECT_EQ(V{}, run(portZero));
@@ -233,11 +231,6 @@ TEST_F(StreamInfoMvdTest, WithoutALocalEndNothingHappensAndAFailedOpenStillRepli
               lines());
     EXPECT_EQ(StreamInfoMvd::STREAM_ENDED, stream->mStat);
     EXPECT_EQ(0u, stream->mMvdStreamId);
-
-    // Codes that are not stream commands are ignored silently.
-    EXPECT_EQ(V{}, run(commandRecord(20)));
-    EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ(V{}, lines());
 }
 
 TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
@@ -273,9 +266,8 @@ TEST_F(StreamInfoMvdTest, RemoteEndIsTakenOnceAndOnlyANewPortReachesTheEngine) {
     c.localAddr.type = kAddrTypeIpv6Alt;
     c.remoteAddr = address("2001:db8::2", 5000);
     const V calls = run(c, v6.get());
-    ASSERT_GE(calls.size(), 4u);
-    EXPECT_EQ("Mvd_Open(\"fe80:0:0:0:0:0:0:1\", 6000, out=2) = 0", calls[0]);
-    EXPECT_EQ("Mvd_SetRmtAddr(2, \"2001:db8:0:0:0:0:0:2\", 5000) = 0", calls[3]);
+    EXPECT_EQ("Mvd_Open(\"fe80:0:0:0:0:0:0:1\", 6000, out=2) = 0", calls.at(0));
+    EXPECT_EQ("Mvd_SetRmtAddr(2, \"2001:db8:0:0:0:0:0:2\", 5000) = 0", calls.at(3));
     EXPECT_THAT(lines(), Contains("D local fe80:0:0:0:0:0:0:1\\6000[2]"));
     EXPECT_THAT(lines(), Contains("D remote 2001:db8:0:0:0:0:0:2\\5000[2]"));
 }
@@ -321,8 +313,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_THAT(lines(), Contains("D codec type 1 is not supported "));
 
     // A codec that cannot be read is left alone and the stream still runs.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     hostfakes::setResult("Mvd_GetCdc", -1);
     EXPECT_EQ(then(reachedTheCodec, {"Mvd_GetCdc(1, \"H264\", out=-) = -1", "Mvd_RedSetEnable(1, 0) = 0",
                                      "Mvd_ProcStart(1) = 0", kAttachFront}),
@@ -330,8 +321,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
     EXPECT_THAT(lines(), Contains("E checkIfCodecParamUpdated: GetCodec failed !!!"));
 
     // A codec the engine refuses stops the command before processing.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     hostfakes::setResult("Mvd_SetCdc", -1);
     const V calls = run(start(VTSP_STREAM_DIR_SENDRECV));
     ASSERT_FALSE(calls.empty());
@@ -342,8 +332,7 @@ TEST_F(StreamInfoMvdTest, CodecStepFailuresDecideWhetherProcessingStarts) {
 
     // Refused on a running stream, after every engine stream was suspended
     // for it: they go on with the codec they had.
-    stream = makeStream();
-    hostfakes::reset();
+    fresh();
     startRunning();
     hostfakes::setResult("Mvd_SetCdc", -1);
     StreamCommand newPayload = modify(VTSP_STREAM_DIR_SENDRECV);
@@ -361,9 +350,8 @@ TEST_F(StreamInfoMvdTest, OnlyTheVideoOrientationUriSetsTheExtension) {
     c.extmapId = 3;
     c.extmapUri = "urn:3gpp:video-orientation";
     const V calls = run(c);
-    ASSERT_GE(calls.size(), 4u);
-    EXPECT_EQ("Mvd_RtpSetExt(1, 2, 3) = 0", calls[calls.size() - 4]);
-    EXPECT_EQ("Mvd_RedSetEnable(1, 0) = 0", calls[calls.size() - 3]);
+    EXPECT_EQ((V{"Mvd_RtpSetExt(1, 2, 3) = 0", "Mvd_RedSetEnable(1, 0) = 0", "Mvd_ProcStart(1) = 0", kAttachFront}),
+              V(calls.end() - std::min<size_t>(4, calls.size()), calls.end()));
     EXPECT_THAT(lines(), Contains("D rtcpParamConfigMvd_RtpSetExt, extension: 1, "
                                   "uri: urn:3gpp:video-orientation, id: 3"));
 
@@ -389,14 +377,12 @@ TEST_F(StreamInfoMvdTest, RtcpMaskChangeOnAnActiveStreamIsWrappedInASuspend) {
                  "Mvd_TptEnableNack(1, 1) = 0", "Mvd_TptEnableFir(1, 0) = 0", "Mvd_ResumeAllStrm() = 0"}),
               run(rtcpMask(1, 0x30)));
     EXPECT_EQ(nullptr, reply);
-    EXPECT_EQ((V{"D _VTSP_CMD_CONFIG",
-                 "D Recive RTCP mask 48",
+    EXPECT_EQ((V{"D _VTSP_CMD_CONFIG", "D Recive RTCP mask 48",
                  "D rtcpParamConfig Recive RTCP mask, templCode: 23, data[0]: 1, data[2]: 48, mRTCPEnableMask: 16",
                  "D rtcpParamConfigMvd_RtpSetExt, extension: 0, uri: , id: 0",
                  "D rtcpParamConfig: Mvd_RedSetEnable(), ret 0",
                  "D rtcpParamConfig Mvd_SuspendAllStrm, rtcp params changed ",
-                 "D rtcpParamConfig: Mvd_TptEnableTmmbr(), ret 0",
-                 "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
+                 "D rtcpParamConfig: Mvd_TptEnableTmmbr(), ret 0", "D rtcpParamConfig: Mvd_TptEnableNack(), ret 0",
                  "D rtcpParamConfig: Mvd_TptEnableFir(), ret 0"}),
               lines());
 

@@ -1,9 +1,10 @@
 // The modem command link run on a raw pseudo-terminal with its real threads:
 // record assembly and routing, a whole call from the modem's side, pausing,
 // shutdown in every state, a flood held back at the pipe, an unusable device,
-// garbage on the pipe, SIGUSR1 storms and a device that refuses reads or
-// writes for a while. Every record accepted while the link runs is handled
-// exactly once and every reply is written whole.
+// SIGUSR1 storms and a device that refuses writes for a while. Every record
+// accepted while the link runs is handled exactly once and every reply is
+// written whole. Random record bodies through the dispatcher and the streams
+// are fuzz_records' part.
 #include <android/log.h>
 #include <fcntl.h>
 #include <gtest/gtest.h>
@@ -18,7 +19,6 @@
 #include <filesystem>
 #include <fstream>
 #include <future>
-#include <random>
 #include <set>
 #include <string>
 #include <thread>
@@ -99,6 +99,9 @@ StreamCommand startCommand(uint32_t streamId, const char* localIp = "10.0.0.1", 
     return c;
 }
 
+// The reply to a start of stream `id` from startCommand's local end.
+std::string bindOf(uint32_t id) { return kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000"; }
+
 std::string recvLine(int msg, int target) {
     return "cmdRxFunc, recv msg " + std::to_string(msg) + ", targetModule " + std::to_string(target);
 }
@@ -129,6 +132,14 @@ protected:
 
     // Nobody reads the pseudo-terminal after this, so tests write nothing more.
     void destroyLink() { mOwned.destroy(); }
+    // Destroys the link, which must wake its threads rather than wait out
+    // a 2 s retry pause, and close the device.
+    void destroyPromptly() {
+        const auto before = Clock::now();
+        destroyLink();
+        EXPECT_LT(msSince(before), 1800);
+        EXPECT_EQ(-1, link.mFd);
+    }
 
     void startLink() {
         ASSERT_TRUE(mOwned.init());
@@ -200,16 +211,28 @@ protected:
 
 }  // namespace
 
-TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
+TEST_F(VtspManagerTest, RecordsForOtherModulesAreDroppedAndAWholeCallGoesThrough) {
     startLink();
+    // Each of these carries a valid start: any of them reaching the handler
+    // would open a media engine stream and send a bind request.
+    const StreamCommand other = startCommand(9, "10.0.0.9", 6010);
+    pty.writeRecord(streamRecord(other, 0, VPMD_VPAD_TARGET));
+    pty.writeRecord(streamRecord(other, 0, VPMD_NET_TARGET));
+    pty.writeRecord(streamRecord(other, 0, 5));
+    pty.writeRecord(streamRecord(other, 3, VPMD_VIDEO_CMDEVT_TARGET));
     // The start arrives one byte a write and is still routed once.
     StreamCommand start = startCommand(7);
     pty.writeRecord(streamRecord(start), 1);
-    // The reply goes out in wire order (read back here in host order); how
-    // a body is turned and composed is CmdBufferTest's business.
-    EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
-    EXPECT_EQ((V{recvLine(1, 0), kWritten}), linkLines());
-    EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
+    // The queue keeps order, so this bind request proves that none of the
+    // first four was queued before it. It goes out in wire order (read back
+    // here in host order); how a body is turned and composed is
+    // CmdBufferTest's business.
+    EXPECT_EQ(bindOf(7), readBind());
+    EXPECT_EQ((V{recvLine(1, 8), "cmdRxFunc, recv VPMD_VPAD_TARGET, modem is active", recvLine(2, 1),
+                 recvLine(3, 5), recvLine(4, 0), "cmdRxFunc, msg 4, VPMD_VIDEO_CMDEVT_TARGET, type 3",
+                 recvLine(5, 0), kWritten}),
+              linkLines());
+    for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
     EXPECT_TRUE(called("Mvd_ProcStart(1) = 0"));
 
     // Each later kind of command reaches the stream: RTCP feedback, a hold, the end.
@@ -225,35 +248,8 @@ TEST_F(VtspManagerTest, WholeCallFromTheModemsSide) {
     start.code = _VTSP_CMD_STREAM_VIDEO_END;
     pty.writeRecord(streamRecord(start));
     EXPECT_TRUE(called("Mvd_Close(1) = 0"));
-    EXPECT_EQ(0u, link.mCmdCallback->streamCount());
-    EXPECT_TRUE(hostfakes::openMvdStreams().empty());
-    // Only the start had a reply.
-    EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, kWritten));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(4, 0)));
-}
-
-TEST_F(VtspManagerTest, RoutesByTargetModuleAndRecordType) {
-    startLink();
-    // Each of these carries a valid start: any of them reaching the handler
-    // would open a media engine stream and send a bind request.
-    const StreamCommand start = startCommand(7);
-    pty.writeRecord(streamRecord(start, 0, VPMD_VPAD_TARGET));
-    pty.writeRecord(streamRecord(start, 0, VPMD_NET_TARGET));
-    pty.writeRecord(streamRecord(start, 0, 5));
-    pty.writeRecord(streamRecord(start, 3, VPMD_VIDEO_CMDEVT_TARGET));
-    pty.writeRecord(streamRecord(startCommand(9, "10.0.0.9", 6010)));
-
-    // The queue keeps order, so the bind request of the fifth record proves
-    // that none of the first four was queued before it.
-    EXPECT_EQ(kWholeBind + "stream 9 at 10.0.0.9:6010", readBind());
-    EXPECT_EQ((V{recvLine(1, 8), "cmdRxFunc, recv VPMD_VPAD_TARGET, modem is active", recvLine(2, 1),
-                 recvLine(3, 5), recvLine(4, 0), "cmdRxFunc, msg 4, VPMD_VIDEO_CMDEVT_TARGET, type 3",
-                 recvLine(5, 0), kWritten}),
-              linkLines());
-    for (const LogLine& l : log.linesWithTag(kTag)) EXPECT_EQ(ANDROID_LOG_DEBUG, l.priority) << l.text;
+    EXPECT_TRUE(pty.silentFor(100ms));  // only the start had a reply
     EXPECT_EQ(1u, hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ("Mvd_Open(\"10.0.0.9\", 6010, out=1) = 0", hostfakes::callTexts().at(0));
 }
 
 TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
@@ -261,12 +257,9 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     // Named threads, each sleeping: the receiver in read, the others in their queues.
     ASSERT_TRUE(eventually([] { return linkThreads(1, 'S'); }));
     ASSERT_EQ(2u, openDescriptorsOn(pty.devicePath()));  // ours and the link's
-    auto before = Clock::now();
-    destroyLink();
-    EXPECT_LT(msSince(before), 1800);  // woken, not waited for
+    destroyPromptly();
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, "cmdHandleFunc: cmdHandleFunc: Rx queue is stop"));
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kTag, "cmdTxFunc: cmdTxFunc: Tx queue is stop"));
-    EXPECT_EQ(-1, link.mFd);
     EXPECT_EQ(1u, openDescriptorsOn(pty.devicePath()));
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 
@@ -281,11 +274,7 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
     EXPECT_EQ(2u, openDescriptorsOn(pty.devicePath()));
     // A round trip gives any extra thread time to announce itself.
     pty.writeRecord(streamRecord(startCommand(7)));
-    EXPECT_EQ(kWholeBind + "stream 7 at 10.0.0.1:6000", readBind());
-    EXPECT_TRUE(log.contains(ANDROID_LOG_DEBUG, kTag, recvLine(1, 0)));
-    for (const char* entry : {kRxEntry, kTxEntry, kHdEntry}) {
-        EXPECT_EQ(1u, log.count(ANDROID_LOG_DEBUG, kTag, entry)) << entry;
-    }
+    EXPECT_EQ(bindOf(7), readBind());
     EXPECT_TRUE(linkThreads(1));
 
     // A closed modem end is logged (the kernel reports the hang-up as an
@@ -297,10 +286,7 @@ TEST_F(VtspManagerTest, DestroyEndsBlockedThreadsAndTheLinkComesBackOnce) {
         }
         return false;
     }));
-    before = Clock::now();
-    destroyLink();
-    EXPECT_LT(msSince(before), 1800);  // woken, not waited for
-    EXPECT_EQ(-1, link.mFd);
+    destroyPromptly();
     EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
 
@@ -331,30 +317,17 @@ TEST_F(VtspManagerTest, ReplyCutShortByDestroyIsFinishedFirstWhenTheLinkRunsAgai
     pty.writeRecord(streamRecord(startCommand(kStarts + 1)));
     // Whole records only: every reply written before, the cut one completed,
     // then the new one.
-    for (size_t id = 1; id <= written; ++id) {
-        ASSERT_EQ(kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000", readBind());
-    }
-    EXPECT_EQ(kWholeBind + "stream " + std::to_string(kStarts + 1) + " at 10.0.0.1:6000", readBind());
+    for (size_t id = 1; id <= written; ++id) ASSERT_EQ(bindOf(id), readBind());
+    EXPECT_EQ(bindOf(kStarts + 1), readBind());
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, kTag, "writeToVpr: rest of the unfinished record written to " +
                                                          std::string(pty.devicePath())));
 }
 
-// Threads inherit the signal mask of the thread that starts them.
-TEST_F(VtspManagerTest, LinkStartedWithSigusr1BlockedStillEnds) {
-    WatchedThreads watch(10s);
-    auto ended = watch.run([&] {
-        sigset_t set;
-        sigemptyset(&set);
-        sigaddset(&set, SIGUSR1);
-        pthread_sigmask(SIG_BLOCK, &set, nullptr);
-        startLink();
-        destroyLink();
-    });
-    EXPECT_TRUE(watch.finishes(ended));
-    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
-}
-
-TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirst) {
+TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirstAndANeverStartedOneWakesNone) {
+    VtspManager closed(pty.devicePath());
+    closed.destroy();
+    EXPECT_EQ(-1, closed.mFd);
+    EXPECT_TRUE(log.linesWithTag(kTag).empty());
     auto running = std::make_unique<VtspManager>(pty.devicePath());
     ASSERT_TRUE(running->init());
     ASSERT_TRUE(eventually([] { return linkThreads(1, 'S'); }));
@@ -385,9 +358,7 @@ TEST_F(VtspManagerTest, FloodWaitsAtTheHighWaterMarkAndIsHandledInOrder) {
     EXPECT_LT(written.load(), kFlood);  // the full pipe holds the modem's writes back
 
     hostfakes::releaseCalls();
-    for (uint32_t id = 1; id <= kFlood; ++id) {
-        ASSERT_EQ(kWholeBind + "stream " + std::to_string(id) + " at 10.0.0.1:6000", readBind());
-    }
+    for (uint32_t id = 1; id <= kFlood; ++id) ASSERT_EQ(bindOf(id), readBind());
     EXPECT_EQ(high, link.mRxQueue.peakSize());
     EXPECT_EQ(kFlood, hostfakes::callCount("Mvd_Open"));
 }
@@ -419,7 +390,7 @@ TEST_F(VtspManagerTest, StopAndDestroyEndAReceiverWaitingForRoom) {
     EXPECT_EQ(-1, link.mFd);
 }
 
-TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
+TEST_F(VtspManagerTest, WakeUpSignalNeitherEndsTheProcessRightAfterInitNorIsLostToABlockedMask) {
     // The wake-up signal's default action ends the process, so destroy must
     // not be able to send it before the link has set up its handler. Earlier
     // links in this process may have installed one already: start from the default.
@@ -435,13 +406,19 @@ TEST_F(VtspManagerTest, DestroyRightAfterInitDoesNotEndTheProcess) {
         destroyLink();
         ASSERT_EQ(-1, link.mFd);
     }
-}
 
-TEST_F(VtspManagerTest, DestroyWithoutInitWakesNoThread) {
-    VtspManager closed(pty.devicePath());
-    closed.destroy();
-    EXPECT_EQ(-1, closed.mFd);
-    EXPECT_TRUE(log.linesWithTag(kTag).empty());
+    // Threads inherit the signal mask of the thread that starts them.
+    WatchedThreads watch(10s);
+    auto ended = watch.run([&] {
+        sigset_t set;
+        sigemptyset(&set);
+        sigaddset(&set, SIGUSR1);
+        pthread_sigmask(SIG_BLOCK, &set, nullptr);
+        startLink();
+        destroyLink();
+    });
+    EXPECT_TRUE(watch.finishes(ended));
+    EXPECT_TRUE(eventually([] { return linkThreads(0); }));
 }
 
 // A device that cannot be opened, or that is at its end, is a failed read
@@ -472,43 +449,6 @@ TEST_F(VtspManagerTest, UnreadableDeviceIsRetriedEveryTwoSeconds) {
     }
 }
 
-TEST_F(VtspManagerTest, GarbageRecordsDoNotDerailTheLink) {
-    startLink();
-    std::mt19937 random(20240611u);
-    constexpr int kGarbage = 20;
-    for (int i = 0; i < kGarbage; ++i) {
-        VPR_Comm record;
-        unsigned char* bytes = reinterpret_cast<unsigned char*>(&record);
-        for (size_t k = 0; k < sizeof(record); ++k) bytes[k] = static_cast<unsigned char>(random());
-        // Steer most records into the stream commands so the dispatcher and
-        // the streams see the random bodies too.
-        const int32_t codes[] = {_VTSP_CMD_STREAM_VIDEO_START, _VTSP_CMD_STREAM_VIDEO_MODITY, _VTSP_CMD_CONFIG,
-                                 _VTSP_CMD_STREAM_VIDEO_END};
-        VtspCommand* body = reinterpret_cast<VtspCommand*>(record.body);
-        if (i % 5 != 4) body->code = codes[i % 4];
-        if (i % 2 == 0) {
-            body->u.stmVideo.localAddr.type = static_cast<uint32_t>(i % 4);
-            body->u.stmVideo.dir = static_cast<uint32_t>(i % 5);
-            body->u.stmVideo.encoder = 0;
-        }
-        record.type = 0;
-        record.targetModule = VPMD_VIDEO_CMDEVT_TARGET;
-        pty.writeRecord(record);
-    }
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_DEBUG, kTag, recvLine(kGarbage, 0)));
-
-    pty.writeRecord(streamRecord(startCommand(4242)));
-    // Garbage starts may have been answered first; every answer is a whole bind request.
-    const std::string expected = kWholeBind + "stream 4242 at 10.0.0.1:6000";
-    std::string bind;
-    for (int n = 0; n <= kGarbage && bind != expected; ++n) {
-        bind = readBind();
-        ASSERT_EQ(0u, bind.rfind(kWholeBind, 0)) << bind;
-    }
-    EXPECT_EQ(expected, bind);
-    EXPECT_TRUE(link.mCmdCallback->snapshot(4242));
-}
-
 TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
     startLink();
     const pthread_t targets[] = {link.mRxThread, link.mTxThread, link.mHandleThread};
@@ -533,8 +473,6 @@ TEST_F(VtspManagerTest, Sigusr1StormLosesAndRepeatsNothing) {
     EXPECT_EQ(range(1, kRecords), ids);
     EXPECT_TRUE(pty.silentFor(100ms));
     EXPECT_EQ(static_cast<size_t>(kRecords), recvLines());
-    EXPECT_EQ(static_cast<size_t>(kRecords), hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ(static_cast<size_t>(kRecords), link.mCmdCallback->streamCount());
 }
 
 // The link's descriptor is swapped for a read-only one on the same device:
@@ -563,69 +501,25 @@ TEST_F(VtspManagerTest, FailedWriteIsRetriedAfterAPauseAndResumes) {
     ASSERT_EQ(link.mFd, dup2(readOnly, link.mFd));
     pty.writeRecord(streamRecord(startCommand(6)));
     ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 4, 8s));
-    const auto before = Clock::now();
-    destroyLink();
-    EXPECT_LT(msSince(before), 1800);  // shorter than the 2 s retry pause
-    EXPECT_EQ(-1, link.mFd);
+    destroyPromptly();
     close(readOnly);
-    close(readWrite);
-}
-
-TEST_F(VtspManagerTest, FailedReadIsRetriedAfterAPauseAndResumes) {
-    startLink();
-    const int writeOnly = open(pty.devicePath(), O_WRONLY | O_NOCTTY);
-    const int readWrite = open(pty.devicePath(), O_RDWR | O_NOCTTY);
-    ASSERT_GE(writeOnly, 0);
-    ASSERT_GE(readWrite, 0);
-    pty.writeRecord(streamRecord(startCommand(10)));
-    EXPECT_EQ(range(10, 10), readBinds(1));
-    ASSERT_EQ(link.mFd, dup2(writeOnly, link.mFd));
-    const std::string failed = "readFromVpr: cmdRxFunc: failed to read file, error Bad file descriptor";
-
-    // The receive thread may already sit in a read that keeps the old
-    // descriptor, which record 11 then completes; either way the reads after
-    // that fail, and record 11 is read once, before or after the repair.
-    pty.writeRecord(streamRecord(startCommand(11)));
-    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, failed, 2, 5s));
-    EXPECT_GE(log.firstGap(ANDROID_LOG_ERROR, kTag, failed).count(), 1900);  // a pause, not a busy loop
-
-    // The device works again: the next record is read whole and handled once.
-    ASSERT_EQ(link.mFd, dup2(readWrite, link.mFd));
-    pty.writeRecord(streamRecord(startCommand(12)));
-    EXPECT_EQ(range(11, 12), readBinds(2));
-    EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(3u, hostfakes::callCount("Mvd_Open"));
-    EXPECT_EQ(3u, recvLines());
-    close(writeOnly);
     close(readWrite);
 }
 
 TEST_F(VtspManagerTest, StopAndStartBetweenRecordsHandleOnlyAcceptedOnes) {
     startLink();
     constexpr int kPerPhase = 5;
-    size_t refused = 0;
-    for (int cycle = 0; cycle < 3; ++cycle) {
-        SCOPED_TRACE(cycle);
-        const int running = 100 * cycle + 1, stopped = 100 * cycle + 50;
-        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(running + i)));
-        EXPECT_EQ(range(running, running + kPerPhase - 1), readBinds(kPerPhase));
-        link.stop();
-        for (int i = 0; i < kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(stopped + i)));
-        refused += kPerPhase;
-        ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, refused));
-        link.start();
-    }
-    const int last = 1000;
-    pty.writeRecord(streamRecord(startCommand(last)));
-    EXPECT_EQ(range(last, last), readBinds(1));
+    for (int i = 1; i <= kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(i)));
+    EXPECT_EQ(range(1, kPerPhase), readBinds(kPerPhase));
+    link.stop();
+    for (int i = 51; i <= 50 + kPerPhase; ++i) pty.writeRecord(streamRecord(startCommand(i)));
+    ASSERT_TRUE(log.waitFor(ANDROID_LOG_ERROR, kTag, kRefused, kPerPhase));
+    link.start();
+    pty.writeRecord(streamRecord(startCommand(100)));
+    EXPECT_EQ(range(100, 100), readBinds(1));
     EXPECT_TRUE(pty.silentFor(100ms));
-    EXPECT_EQ(refused, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
-    EXPECT_EQ(2 * refused + 1, recvLines());
-    EXPECT_EQ(refused + 1, hostfakes::callCount("Mvd_Open"));
-    for (int cycle = 0; cycle < 3; ++cycle) {
-        for (int i = 0; i < kPerPhase; ++i) {
-            EXPECT_TRUE(link.mCmdCallback->snapshot(100 * cycle + 1 + i));
-            EXPECT_FALSE(link.mCmdCallback->snapshot(100 * cycle + 50 + i));
-        }
-    }
+    EXPECT_EQ(size_t{kPerPhase}, log.count(ANDROID_LOG_ERROR, kTag, kRefused));
+    EXPECT_EQ(size_t{2 * kPerPhase + 1}, recvLines());
+    EXPECT_EQ(size_t{kPerPhase + 1}, hostfakes::callCount("Mvd_Open"));
+    EXPECT_FALSE(link.mCmdCallback->snapshot(51));
 }
