@@ -48,13 +48,29 @@ bool resetPeakResident() {
     return static_cast<bool>(out);
 }
 
-double machineBusySeconds() {
-    // First line: "cpu user nice system idle iowait irq softirq steal ...", in clock ticks.
+namespace {
+
+// The machine's first /proc/stat line: "cpu user nice system idle iowait irq
+// softirq steal ...", in clock ticks.
+struct MachineTicks {
+    long long user = 0, nice = 0, system = 0, idle = 0, iowait = 0, irq = 0, softirq = 0, steal = 0;
+};
+
+MachineTicks machineTicks() {
     std::istringstream in(firstLine("/proc/stat"));
     std::string cpu;
-    long long user = 0, nice = 0, system = 0, idle = 0, iowait = 0, irq = 0, softirq = 0, steal = 0;
-    in >> cpu >> user >> nice >> system >> idle >> iowait >> irq >> softirq >> steal;
-    return static_cast<double>(user + nice + system + irq + softirq + steal) / static_cast<double>(sysconf(_SC_CLK_TCK));
+    MachineTicks t;
+    in >> cpu >> t.user >> t.nice >> t.system >> t.idle >> t.iowait >> t.irq >> t.softirq >> t.steal;
+    return t;
+}
+
+double ticksToSeconds(long long ticks) { return static_cast<double>(ticks) / static_cast<double>(sysconf(_SC_CLK_TCK)); }
+
+}  // namespace
+
+double machineBusySeconds() {
+    const MachineTicks t = machineTicks();
+    return ticksToSeconds(t.user + t.nice + t.system + t.irq + t.softirq + t.steal);
 }
 
 namespace {
@@ -84,11 +100,8 @@ long long kernelThreadTicks(const std::string& pid) {
 }  // namespace
 
 double kernelWorkSeconds() {
-    std::istringstream in(firstLine("/proc/stat"));
-    std::string cpu;
-    long long user = 0, nice = 0, system = 0, idle = 0, iowait = 0, irq = 0, softirq = 0;
-    in >> cpu >> user >> nice >> system >> idle >> iowait >> irq >> softirq;
-    long long ticks = irq + softirq;
+    const MachineTicks t = machineTicks();
+    long long ticks = t.irq + t.softirq;
     if (DIR* dir = opendir("/proc")) {
         while (const dirent* entry = readdir(dir)) {
             if (entry->d_name[0] < '0' || entry->d_name[0] > '9') continue;
@@ -96,7 +109,7 @@ double kernelWorkSeconds() {
         }
         closedir(dir);
     }
-    return static_cast<double>(ticks) / static_cast<double>(sysconf(_SC_CLK_TCK));
+    return ticksToSeconds(ticks);
 }
 
 unsigned cpuCount() {
