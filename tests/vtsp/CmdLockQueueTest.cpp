@@ -13,7 +13,6 @@
 #include <future>
 #include <memory>
 #include <string>
-#include <thread>
 
 #include "CmdBuffer.h"
 #include "CmdLockQueue.h"

@@ -10,7 +10,6 @@
 #include <gtest/gtest.h>
 #include <pthread.h>
 #include <signal.h>
-#include <sys/types.h>
 #include <unistd.h>
 
 #include <algorithm>
