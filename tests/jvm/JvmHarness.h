@@ -14,7 +14,6 @@
 #include <jni.h>
 #include <utils/StrongPointer.h>
 
-#include <chrono>
 #include <initializer_list>
 #include <memory>
 #include <optional>
@@ -74,6 +73,7 @@ struct Local : std::unique_ptr<std::remove_pointer_t<T>, LocalDelete> {
 inline jvalue I(jint v) { jvalue j; j.i = v; return j; }
 inline jvalue J(jlong v) { jvalue j; j.j = v; return j; }
 inline jvalue L(jobject v) { jvalue j; j.l = v; return j; }
+inline jvalue Z(bool v) { jvalue j; j.z = v ? JNI_TRUE : JNI_FALSE; return j; }
 
 // A static call by class, name and exact signature; the answer is in the
 // member the signature's return type names (a returned object is a local
@@ -107,11 +107,7 @@ inline std::string threadOf(const std::string& upcall) { return upcall.substr(up
 // detached again (no live Java thread has its name).
 ::testing::Matcher<std::string> onAttachedThread(const std::string& call);
 inline void setUpcallResult(jint value) { callStatic(kUpcallLog, "setResult", "(I)V", {I(value)}); }
-inline void setUpcallThrowing(bool throwing) {
-    jvalue v;
-    v.z = throwing ? JNI_TRUE : JNI_FALSE;
-    callStatic(kUpcallLog, "setThrowing", "(Z)V", {v});
-}
+inline void setUpcallThrowing(bool throwing) { callStatic(kUpcallLog, "setThrowing", "(Z)V", {Z(throwing)}); }
 inline void setScreenOrientation(jint value) {
     callStatic(kVceService, "setScreenOrientation", "(I)V", {I(value)});
 }

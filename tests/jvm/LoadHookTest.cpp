@@ -45,7 +45,7 @@ protected:
 
 }  // namespace
 
-TEST_F(LoadHookTest, LoadLogsTheBuildAndRegistersBothClasses) {
+TEST_F(LoadHookTest, LoadLogsTheBuildRegistersBothClassesAndEachInitAService) {
     JVM_REQUIRE_FRESH_PROCESS();
     load();
     // The library's build date and time, as the compiler writes them.
@@ -56,11 +56,8 @@ TEST_F(LoadHookTest, LoadLogsTheBuildAndRegistersBothClasses) {
     EXPECT_EQ(V{"4 " + std::string(kMmeRegistered)}, linesOf(kRegistrationTag));
     EXPECT_EQ(jvm(), vce_jvm);
     EXPECT_TRUE(clazz != nullptr && env()->IsSameObject(clazz, Local<jclass>(findClass(kVceService))));
-}
 
-TEST_F(LoadHookTest, EveryInitCreatesAndRegistersAServiceObject) {
-    JVM_REQUIRE_FRESH_PROCESS();
-    load();
+    // Each init makes a new service object and registers it in the old one's place.
     EXPECT_EQ(nullptr, registeredService());
     EXPECT_EQ(2, vceServiceInit());
     const android::sp<android::IBinder> first = registeredService();
@@ -71,7 +68,7 @@ TEST_F(LoadHookTest, EveryInitCreatesAndRegistersAServiceObject) {
     EXPECT_EQ(2u, log.count(ANDROID_LOG_INFO, kJniTag, "VideoCallEngineService::Instance return 0"));
 }
 
-TEST_F(LoadHookTest, TheLibraryExportsItsEntryAndSharedSymbols) {
+TEST_F(LoadHookTest, TheLibraryExportsItsSymbolsAndNamesMmeFromThePrefix) {
     load();
     void* library = dlopen(QUELLBORN_LIBRARY_DIR "/libquellborn.so", RTLD_NOW | RTLD_NOLOAD);
     ASSERT_NE(nullptr, library) << dlerror();
@@ -81,6 +78,26 @@ TEST_F(LoadHookTest, TheLibraryExportsItsEntryAndSharedSymbols) {
     // Only the load hook goes without C++ decoration.
     EXPECT_EQ(nullptr, dlsym(library, "getScreenOrientation"));
     dlclose(library);
+
+    EXPECT_EQ(0, android::registerMmeNatives(jvm(), env(), "com/tessaroval/vce"));
+    EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, kRegistrationTag, kMmeRegistered));
+    // 95 characters and "/Mme" fill the 100-byte buffer exactly; one more
+    // and the name would be cut, which is taken as no such class.
+    const std::string fits(95, 'a'), cut(96, 'a');
+    for (const auto& [prefix, logged] :
+         {std::pair<std::string, std::string>{"com/nowhere", "com/nowhere/Mme"},
+          {fits, fits + "/Mme"},
+          {cut, cut + "/Mm"}}) {
+        EXPECT_EQ(-2, android::registerMmeNatives(jvm(), env(), prefix.c_str())) << prefix;
+        EXPECT_TRUE(log.contains(ANDROID_LOG_ERROR, kRegistrationTag, "Failed to find class: " + logged))
+                << prefix;
+        EXPECT_FALSE(env()->ExceptionCheck());
+    }
+    // The registration that stands is still the good one; its RPC test
+    // natives (called nowhere else) answer 0 and call nothing.
+    EXPECT_EQ(0, mme("startRpcTest", "()I"));
+    EXPECT_EQ(0, mme("endRpcTest", "()I"));
+    EXPECT_TRUE(hostfakes::callTexts().empty());
 }
 
 TEST_F(LoadHookTest, WithoutMmeTheLoadFailsButInitStaysRegistered) {
@@ -112,27 +129,4 @@ TEST_F(LoadHookTest, WithoutVceServiceTheLoadFailsBeforeAnyRegistration) {
     EXPECT_EQ(0, onNativeThread([] { return getScreenOrientation(); }));
     vce_jvm = real;
     EXPECT_EQ(0, gTouches.load());
-}
-
-TEST_F(LoadHookTest, MmeRegistrationBuildsTheClassNameFromThePrefix) {
-    load();
-    EXPECT_EQ(0, android::registerMmeNatives(jvm(), env(), "com/tessaroval/vce"));
-    EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, kRegistrationTag, kMmeRegistered));
-    // 95 characters and "/Mme" fill the 100-byte buffer exactly; one more
-    // and the name would be cut, which is taken as no such class.
-    const std::string fits(95, 'a'), cut(96, 'a');
-    for (const auto& [prefix, logged] :
-         {std::pair<std::string, std::string>{"com/nowhere", "com/nowhere/Mme"},
-          {fits, fits + "/Mme"},
-          {cut, cut + "/Mm"}}) {
-        EXPECT_EQ(-2, android::registerMmeNatives(jvm(), env(), prefix.c_str())) << prefix;
-        EXPECT_TRUE(log.contains(ANDROID_LOG_ERROR, kRegistrationTag, "Failed to find class: " + logged))
-                << prefix;
-        EXPECT_FALSE(env()->ExceptionCheck());
-    }
-    // The registration that stands is still the good one; its RPC test
-    // natives (called nowhere else) answer 0 and call nothing.
-    EXPECT_EQ(0, mme("startRpcTest", "()I"));
-    EXPECT_EQ(0, mme("endRpcTest", "()I"));
-    EXPECT_TRUE(hostfakes::callTexts().empty());
 }

@@ -33,7 +33,7 @@ using MmeSystemTest = LoadedCase;
 
 }  // namespace
 
-TEST_F(MmeSystemTest, SysInitStartsTheEngineInOrderOrRollsItAllBack) {
+TEST_F(MmeSystemTest, SysInitStartsTheEngineInOrderOrRollsItAllBackAndSysDestroyStopsIt) {
     const V steps = {"Zos_SysInit", "Mme_Start", "Mvd_TaskStart"};
     const V installBridge = {"Mvd_EvntSetCallback(proc, 1) = 0", "Zpand_ModSetPostDrv(installed) = 0",
                              "Zpand_TimerSetInit(installed) = 0", "Zpand_TimerSetDestroy(installed) = 0",
@@ -60,6 +60,15 @@ TEST_F(MmeSystemTest, SysInitStartsTheEngineInOrderOrRollsItAllBack) {
     // The engine's own text goes to the platform log under its tag.
     ASSERT_TRUE(hostfakes::zosPrint("engine says hello"));
     EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, "MME", "engine says hello"));
+
+    const size_t mark = hostfakes::callCount();
+    EXPECT_EQ(0, mme("sysDestroy", "()I"));
+    EXPECT_EQ(kStopEngine, hostfakes::callTextsSince(mark));
+    EXPECT_THAT(bridgeLines(log), Contains("sysDestroy"));
+    // The upcalls stay in place for an engine that is started again.
+    EXPECT_EQ(0, hostfakes::fireZpandTimerInit());
+    EXPECT_THAT(upcalls().back(), onAttachedThread("zpandTimerInit()"));
+    EXPECT_EQ(0, mme("sysInit", "()I"));
 }
 
 TEST_F(MmeSystemTest, AnUpcallMissingFromTheClassIsOnlyDisabled) {
@@ -71,19 +80,7 @@ TEST_F(MmeSystemTest, AnUpcallMissingFromTheClassIsOnlyDisabled) {
     EXPECT_TRUE(upcalls().empty());
 }
 
-TEST_F(MmeSystemTest, SysDestroyStopsTheEngineAndKeepsTheBridge) {
-    ASSERT_EQ(0, mme("sysInit", "()I"));
-    const size_t mark = hostfakes::callCount();
-    EXPECT_EQ(0, mme("sysDestroy", "()I"));
-    EXPECT_EQ(kStopEngine, hostfakes::callTextsSince(mark));
-    EXPECT_THAT(bridgeLines(log), Contains("sysDestroy"));
-    // The upcalls stay in place for an engine that is started again.
-    EXPECT_EQ(0, hostfakes::fireZpandTimerInit());
-    EXPECT_THAT(upcalls(), ::testing::ElementsAre(onAttachedThread("zpandTimerInit()")));
-    EXPECT_EQ(0, mme("sysInit", "()I"));
-}
-
-TEST_F(MmeSystemTest, WorkDirReachesAllThreeDirectoriesAsUtf8) {
+TEST_F(MmeSystemTest, WorkDirReachesAllThreeDirectoriesAsUtf8AndAppContextTheRuntime) {
     struct Case {
         std::optional<std::u16string> dir;  // nullopt: a null string
         std::string engineText;              // as the call record writes the argument
@@ -110,9 +107,8 @@ TEST_F(MmeSystemTest, WorkDirReachesAllThreeDirectoriesAsUtf8) {
     hostfakes::setResult("Mme_CfgSetCfgDir", -1);
     hostfakes::setResult("Zos_CfgSetLogDir", 7);
     EXPECT_EQ(7, workDir(newString(u"/data/x")));
-}
 
-TEST_F(MmeSystemTest, AppContextIsHandedToTheRuntime) {
+    nextRow(log);
     Local<jobject> context =
             newObject("android/content/Context", "(Ljava/lang/String;)V", {L(newString(u"ims"))});
     EXPECT_EQ(0, mme("cfgSetAppCtx", "(Landroid/content/Context;)I", {L(context)}));
@@ -193,9 +189,8 @@ TEST_F(MmeSystemTest, StatisticsReportTheLastSuccessfulQuery) {
     EXPECT_EQ("Mvd_RtcpGetSta(6) = -1", hostfakes::callTexts().back());
     EXPECT_EQ(expected, captureStatistics(0));
     // (The codec words at 14 and 15: MmeVideoEventTest.)
-}
 
-TEST_F(MmeSystemTest, StatisticsArrayErrorsAreLeftPendingForTheCaller) {
+    // Array errors are left pending for the caller; nothing is written.
     Local<jlongArray> shortArray = newLongArray(8, -1);
     const std::pair<jlongArray, const char*> rows[] = {
             {shortArray, "java.lang.ArrayIndexOutOfBoundsException"},

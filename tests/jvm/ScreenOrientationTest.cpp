@@ -29,7 +29,7 @@ using ScreenOrientationTest = LoadedCase;
 
 }  // namespace
 
-TEST_F(ScreenOrientationTest, AThreadTheJvmKnowsIsNeitherAttachedNorDetached) {
+TEST_F(ScreenOrientationTest, OnlyAThreadTheJvmDoesNotKnowIsAttachedAndOnlyForOneCall) {
     setScreenOrientation(270);
     EXPECT_EQ(270, getScreenOrientation());
     EXPECT_EQ(JNI_OK, envState());
@@ -44,11 +44,11 @@ TEST_F(ScreenOrientationTest, AThreadTheJvmKnowsIsNeitherAttachedNorDetached) {
     }).join();
     EXPECT_EQ(std::make_pair(270, JNI_OK), owner);
     EXPECT_EQ((V{"getScreenOrientation() on main", "getScreenOrientation() on camera-service"}), upcalls());
-}
 
-TEST_F(ScreenOrientationTest, APlainNativeThreadIsAttachedForEachCallOnly) {
+    // A plain native thread is attached for each call only: two calls on one
+    // thread make a new attachment (a new Java thread) each.
+    clearUpcalls();
     setScreenOrientation(-1);
-    // Two calls on one thread: a new attachment (a new Java thread) for each.
     EXPECT_EQ((std::vector<std::pair<int, jint>>{{-1, JNI_EDETACHED}, {-1, JNI_EDETACHED}}),
               fromNativeThread(2));
     const V calls = upcalls();

@@ -28,10 +28,6 @@ struct Recipient : IBinder::DeathRecipient {
     IBinder* from = nullptr;
 };
 
-void writeInts(Parcel* p, std::initializer_list<int32_t> values) {
-    for (int32_t v : values) p->writeInt32(v);
-}
-
 }  // namespace
 
 TEST(RemoteBinder, IsAProxyOfItsDescriptorUntilKilledThenNotifiesEachLinkOnceAndRefusesCalls) {
@@ -63,7 +59,7 @@ TEST(RemoteBinder, IsAProxyOfItsDescriptorUntilKilledThenNotifiesEachLinkOnceAnd
     EXPECT_FALSE(remote->isBinderAlive());
     EXPECT_EQ(DEAD_OBJECT, remote->pingBinder());
     Parcel data, reply;
-    writeInts(&data, {1});
+    data.writeInt32(1);
     EXPECT_EQ(DEAD_OBJECT, remote->transact(0, data, &reply));
     EXPECT_EQ(0, handled.load());
     EXPECT_EQ(0u, remote->transactionCount());
