@@ -12,7 +12,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cstring>
 #include <initializer_list>
 #include <string>
 #include <thread>
@@ -61,6 +60,23 @@ inline void mmeEvent(int event) {
 
 inline bool contains(const std::vector<std::string>& all, const std::string& one) {
     return std::find(all.begin(), all.end(), one) != all.end();
+}
+
+// A command of the modem's for stream `streamId` of a call from 10.0.0.1:6000
+// to 192.168.1.2:`remotePort`.
+inline vtspcodec::StreamCommand streamCommand(int32_t code, uint32_t streamId,
+                                              uint32_t dir = android::VTSP_STREAM_DIR_SENDRECV,
+                                              uint16_t remotePort = 5000) {
+    vtspcodec::StreamCommand c;
+    c.code = code;
+    c.streamId = streamId;
+    c.dir = dir;
+    c.localAddr = vtspcodec::address("10.0.0.1", 6000);
+    c.remoteAddr = vtspcodec::address("192.168.1.2", remotePort);
+    return c;
+}
+inline void modemSends(const vtspcodec::StreamCommand& c) {
+    enginetest::modem().writeRecord(vtspcodec::streamRecord(c));
 }
 
 using enginetest::describe;
@@ -181,25 +197,15 @@ protected:
     // Plays the modem: starts a send-and-receive stream and waits for its
     // bind request, which the link sends once the stream is configured.
     void startStream(uint32_t streamId) {
-        vtspcodec::StreamCommand start;
-        start.code = android::_VTSP_CMD_STREAM_VIDEO_START;
-        start.streamId = streamId;
-        start.dir = android::VTSP_STREAM_DIR_SENDRECV;
-        start.localAddr = vtspcodec::address("10.0.0.1", 6000);
-        start.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(start));
+        modemSends(streamCommand(android::_VTSP_CMD_STREAM_VIDEO_START, streamId));
         android::VPR_Comm record{};  // the bind request's fields are the link's tests' concern
         ASSERT_TRUE(enginetest::modem().readRecord(&record)) << "no bind request";
         EXPECT_EQ(android::VPR_NET_CMD_BIND, vtspcodec::readBindRequest(record).code);
     }
     // Ends it; the engine stream `mvdStream` is then closed.
     void endStream(uint32_t streamId, unsigned int mvdStream) {
-        vtspcodec::StreamCommand end;
-        end.code = android::_VTSP_CMD_STREAM_VIDEO_END;
-        end.streamId = streamId;
-        end.dir = android::VTSP_STREAM_DIR_SENDRECV;
         const size_t from = hostfakes::callCount();
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(end));
+        modemSends(streamCommand(android::_VTSP_CMD_STREAM_VIDEO_END, streamId));
         const std::string closed = "Mvd_Close(" + std::to_string(mvdStream) + ") = 0";
         EXPECT_TRUE(eventually([&] { return contains(hostfakes::callTextsSince(from), closed); })) << closed;
     }
