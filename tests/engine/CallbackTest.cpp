@@ -51,10 +51,7 @@ class CallbackTest : public FreshServiceCase {
 protected:
     // The replies' form is ServiceTest's part.
     static void setCallback(const sp<IBinder>& client) { ASSERT_EQ(0, call(kSetCallback, {}, client).value); }
-    static void remoteVideoSize() {
-        ASSERT_TRUE(hostfakes::fireZmfEvent(
-                27, R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})"));
-    }
+    static void remoteVideoSize() { ASSERT_TRUE(hostfakes::fireZmfEvent(27, kRemoteSize)); }
     // A call in progress: camera open and the remote view shown.
     static void startMedia() {
         ASSERT_EQ(0, call(kCameraId, {1}).value);

@@ -20,7 +20,6 @@ using hostbinder::RemoteBinder;
 namespace {
 
 constexpr auto kWatchdog = 30s;
-const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 const char* const kSizeEvent = "zmfRenderEvtUpdate, evt:28 [Remote], type 0, [640x480]";
 const char* const kDied = "binderDied, ims app died";
 

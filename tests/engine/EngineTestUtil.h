@@ -37,6 +37,8 @@ inline constexpr const char* kFront = "Camera 1, Facing front, Orientation 270";
 inline constexpr const char* kBack = "Camera 0, Facing back, Orientation 90";
 inline constexpr const char* kRemote = "Remote";
 inline constexpr int kFirstHandle = 0x100;
+// The video library's text for a remote picture of 640x480.
+inline constexpr const char* kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 
 // Transaction codes of the service, as the client sends them.
 inline constexpr uint32_t kInit = 0, kSetSurface = 1, kSetCallback = 2, kCleanCallback = 3, kEngineInit = 4,

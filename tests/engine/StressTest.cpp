@@ -23,7 +23,6 @@ constexpr auto kLoadTime = 1500ms;  // each thread starts rounds until then, at 
 constexpr auto kPause = 1ms;        // between a thread's rounds, so no side swamps the log and call record
 constexpr auto kWatchdog = 60s;     // far beyond any round, also under TSan on a busy machine
 constexpr int kClients = 4;
-const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 const std::string kSent = "BpVideoCallEngineCallback notifyCallback";
 
 // One client thread's rounds, and the first answer other than int32 0 with status 0.
