@@ -91,13 +91,10 @@ protected:
         ASSERT_NE(nullptr, enginetest::service());
         // Every case starts from a released engine in normal mode and sees
         // only its own lines and calls, also when several share a process.
-        const size_t removesBefore = completedRemoves();
+        mRemovesBase = completedRemoves();
         send(kRelease);
         send(kEngineInit, {0});
-        ASSERT_TRUE(eventually([&] {
-            return completedRemoves() >=
-                   removesBefore + log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender");
-        }));
+        settleRemovals();
         hostfakes::setNextCameraHandle(kFirstHandle);
         hostfakes::setNextMvdStreamId(1);
         log.clear();
@@ -249,10 +246,8 @@ protected:
     Strings linesOf(const char* tag) const {
         Strings out;
         for (const LogLine& l : log.linesWithTag(tag)) {
-            out.push_back((l.priority == ANDROID_LOG_INFO    ? "I "
-                           : l.priority == ANDROID_LOG_ERROR ? "E "
-                                                             : "? ") +
-                          l.text);
+            const char* p = l.priority == ANDROID_LOG_INFO ? "I " : l.priority == ANDROID_LOG_ERROR ? "E " : "? ";
+            out.push_back(p + l.text);
         }
         return out;
     }

@@ -206,8 +206,7 @@ TEST_F(ServiceTest, OtherCodesGetThePlatformsDefaultHandling) {
     }
     // The default handling is the base's, which knows the interface query:
     // the service has no descriptor of its own.
-    Parcel empty;
-    Parcel reply;
+    Parcel empty, reply;
     EXPECT_EQ(NO_ERROR, service->transact(IBinder::INTERFACE_TRANSACTION, empty, &reply));
     EXPECT_EQ(String16(), reply.readString16());
 }
