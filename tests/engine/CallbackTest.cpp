@@ -1,18 +1,15 @@
 // The client's callback seen from the client: what reaches it on the wire,
-// a callback living in the service's own process, the death of the client's
-// process, and how notifications and callback changes order themselves.
-// The remote video size's path from the video library is ListenerTest's part.
+// a callback living in the service's own process, and the death of the
+// client's process. How notifications and callback changes order themselves
+// is ClientFaultTest's part; the remote video size's path from the video
+// library is ListenerTest's part.
 #include <binder/IInterface.h>
-
-#include <future>
-#include <mutex>
 
 #include "EngineTestUtil.h"
 #include "IVideoCallEngineCallback.h"
 
 using namespace android;
 using namespace enginecase;
-using namespace std::chrono_literals;
 using enginetest::call;
 using hostbinder::RemoteBinder;
 
@@ -54,11 +51,7 @@ class CallbackTest : public FreshServiceCase {
 protected:
     // The replies' form is ServiceTest's part.
     static void setCallback(const sp<IBinder>& client) { ASSERT_EQ(0, call(kSetCallback, {}, client).value); }
-    static void cleanCallback() { ASSERT_EQ(0, call(kCleanCallback).value); }
-    static void remoteVideoSize() {
-        ASSERT_TRUE(hostfakes::fireZmfEvent(
-                27, R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})"));
-    }
+    static void remoteVideoSize() { ASSERT_TRUE(hostfakes::fireZmfEvent(27, kRemoteSize)); }
     // A call in progress: camera open and the remote view shown.
     static void startMedia() {
         ASSERT_EQ(0, call(kCameraId, {1}).value);
@@ -152,7 +145,7 @@ TEST_F(CallbackTest, CleanCallbackUnlinksAndClearsWithoutEndingTheCall) {
     setCallback(client);
     startMedia();
     mark();
-    cleanCallback();
+    ASSERT_EQ(0, call(kCleanCallback).value);
     EXPECT_EQ(0u, client->deathRecipientCount());
     mmeEvent(kRtpBreak);
     EXPECT_EQ(1u, count(kEngineTag, "notifyCallback null"));
@@ -168,43 +161,4 @@ TEST_F(CallbackTest, CleanCallbackUnlinksAndClearsWithoutEndingTheCall) {
     EXPECT_EQ(0u, count(kEngineTag, "VCE is not released as expected"));
     EXPECT_EQ(1u, hostfakes::openCameras().size());
     EXPECT_EQ(Strings{"Remote"}, hostfakes::activeRenders());
-}
-
-TEST_F(CallbackTest, ACallbackChangeWaitsForTheNotificationInProgress) {
-    // The order of what the client's thread and this one see.
-    std::mutex lock;
-    Strings order;
-    auto note = [&](const std::string& what) {
-        std::lock_guard<std::mutex> hold(lock);
-        order.push_back(what);
-    };
-    sp<RemoteBinder> first = new RemoteBinder(
-            [&note](uint32_t, const Parcel& data, Parcel* reply, uint32_t) {
-                std::this_thread::sleep_for(300ms);
-                note("client answered " + std::to_string(data.readInt32()));
-                reply->writeInt32(0);
-                return NO_ERROR;
-            },
-            String16("android.videocallengine.callback"));
-
-    // Clearing the callback.
-    setCallback(first);
-    std::thread events([] { mmeEvent(kRtpBreak); });
-    ASSERT_TRUE(first->waitForTransactions(1, 10s));
-    cleanCallback();
-    note("callback cleared");
-    events.join();
-
-    // Replacing it with another client's.
-    setCallback(first);
-    sp<RemoteBinder> second = enginetest::remoteCallback();
-    events = std::thread([] { mmeEvent(kRtpReceived); });
-    ASSERT_TRUE(first->waitForTransactions(2, 10s));
-    setCallback(second);
-    note("callback replaced");
-    events.join();
-
-    EXPECT_EQ((Strings{"client answered 14", "callback cleared", "client answered 15", "callback replaced"}),
-              order);
-    EXPECT_EQ(Strings{}, received(*second));
 }

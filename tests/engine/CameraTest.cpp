@@ -143,7 +143,7 @@ TEST_F(CameraTest, FailedOpenAnswersMinusOneAndLeavesTheCameraClosed) {
     EXPECT_TRUE(called("camdrvOrientAngle(270) = 0"));
 }
 
-TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
+TEST_F(CameraTest, OrientationRotatesCaptureAndRendersAlsoAtTheExtremes) {
     EXPECT_EQ(0, setCamera(0));
     setSurface(kLocalView);
     setSurface(kRemoteView);
@@ -163,6 +163,12 @@ TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
     EXPECT_EQ(1u, log.count(ANDROID_LOG_INFO, kEngineTag,
                             "setDisplayOrientation, enforce screen orientation to be 0"));
     EXPECT_EQ((Strings{"camdrvOrientAngle(0) = 0", rotateText(kBack, 270)}), orientCalls(0, 1, 1));
+    // Extreme angles give the truncated remainders without overflow:
+    // (360 + 2^31) mod 360 = 128; (720 + 2^31 - 90 * (2^31 - 1)) mod 360 = -142.
+    EXPECT_EQ((Strings{"camdrvOrientAngle(128) = 0", rotateText(kBack, -142), rotateText(kRemote, -142)}),
+              orientCalls(INT32_MIN, INT32_MAX, 2));
+    EXPECT_EQ((Strings{"camdrvOrientAngle(-127) = 0", rotateText(kBack, 233), rotateText(kRemote, 233)}),
+              orientCalls(INT32_MAX, INT32_MIN, 3));
 
     // A closed camera and no preview: only the remote render follows.
     EXPECT_EQ(0, setCamera(-1));
@@ -174,17 +180,6 @@ TEST_F(CameraTest, OrientationRotatesCaptureAndRenders) {
     // The device angle set while closed is the capture's at the next open.
     EXPECT_EQ(0, setCamera(1));
     EXPECT_TRUE(called("camdrvOrientAngle(270) = 0"));
-}
-
-TEST_F(CameraTest, ExtremeOrientationsGiveTheTruncatedRemaindersWithoutOverflow) {
-    EXPECT_EQ(0, setCamera(0));
-    setSurface(kLocalView);
-    setSurface(kRemoteView);
-    // (360 + 2^31) mod 360 = 128; (720 + 2^31 - 90 * (2^31 - 1)) mod 360 = -142.
-    EXPECT_EQ((Strings{"camdrvOrientAngle(128) = 0", rotateText(kBack, -142), rotateText(kRemote, -142)}),
-              orientCalls(INT32_MIN, INT32_MAX, 2));
-    EXPECT_EQ((Strings{"camdrvOrientAngle(-127) = 0", rotateText(kBack, 233), rotateText(kRemote, 233)}),
-              orientCalls(INT32_MAX, INT32_MIN, 3));
 }
 
 TEST_F(CameraTest, SwitchingCamerasClosesTheOpenOneFirst) {

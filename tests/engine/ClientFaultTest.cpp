@@ -1,7 +1,7 @@
 // A client at fault: its process dies while the engine is inside its
-// handler, or before it cleans its callback; its handler is slow; the render
-// library never finishes taking a render away. A callback dead before it is set, and a callback change during
-// a notification, are CallbackTest's part.
+// handler, or before it cleans its callback; its handler is slow, calls back
+// into the engine or changes the callback; the render library never finishes
+// taking a render away. A callback dead before it is set is CallbackTest's part.
 #include <condition_variable>
 #include <functional>
 #include <future>
@@ -20,7 +20,6 @@ using hostbinder::RemoteBinder;
 namespace {
 
 constexpr auto kWatchdog = 30s;
-const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 const char* const kSizeEvent = "zmfRenderEvtUpdate, evt:28 [Remote], type 0, [640x480]";
 const char* const kDied = "binderDied, ims app died";
 
@@ -156,11 +155,15 @@ TEST_F(ClientFaultTest, ADeadClientIsReleasedOnceAndItsCleanAndSuccessorAreHarml
     EXPECT_EQ(2u, count("release X"));
 }
 
-TEST_F(ClientFaultTest, ASlowClientHandlerHoldsUpOnlyOtherNotifications) {
+// A slow handler holds up only the other notifications. Then a handler that
+// calls back into the engine (the binder driver runs such a call on the
+// notifying thread) while another client thread releases: the release waits
+// for the notification, the handler's call does not wait for the release.
+TEST_F(ClientFaultTest, ASlowHandlerHoldsUpOnlyNotificationsAndAReleaseNotItsOwnCallBack) {
     const sp<RemoteBinder> client = gatedClient();
     send(kSetCallback, {}, client);
     auto broken = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); });
-    ASSERT_TRUE(client->waitForTransactions(1, kWatchdog));
+    ASSERT_TRUE(handlerInside());
     // Two more events on two more threads reach the engine and wait for the first.
     auto received23 = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{23}}); });
     auto sized = onThread([] { return hostfakes::fireZmfEvent(27, kRemoteSize); });
@@ -195,6 +198,23 @@ TEST_F(ClientFaultTest, ASlowClientHandlerHoldsUpOnlyOtherNotifications) {
     EXPECT_EQ((Strings{"code 0 flags 0: 14", "code 0 flags 0: 15", "code 1 flags 0: 11 640 480 0"}), delivered);
     EXPECT_EQ(1, mMostInside);
     EXPECT_EQ(0u, count("notifyCallback null"));
+
+    // Again with a call in progress, which another client thread releases.
+    closeGate();
+    startMedia();
+    auto notified = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); });
+    ASSERT_TRUE(handlerInside());
+    auto released = onThread([this] { return send(kRelease); });
+    // The camera closing is the release's last step before it waits for the notification.
+    ASSERT_TRUE(eventually([] { return hostfakes::openCameras().empty(); }));
+    auto nested = onThread([] { return enginetest::call(kOrientation, {90, 0, 1}).status; });
+    ASSERT_TRUE(finishes(nested));
+    EXPECT_EQ(NO_ERROR, nested.get());
+    EXPECT_EQ(1u, count("setDisplayOrientation, device: 0 -> 90, screen: 0 -> 0, auto_rotate: 1 -> 1"));
+    EXPECT_EQ(0u, count("release X"));
+    openGate();
+    ASSERT_TRUE(finishes(notified) && finishes(released));
+    EXPECT_EQ(1u, count("release X"));
 }
 
 // The render library never finishes taking a render away: adding that render
@@ -216,28 +236,6 @@ TEST_F(ClientFaultTest, AHungRenderRemovalStallsNoOtherRequest) {
     EXPECT_EQ(0, others.get());
     EXPECT_EQ(0, again.get());
     EXPECT_TRUE(logged("addRender, removal of Remote still pending, adding it anyway", ANDROID_LOG_ERROR));
-}
-
-// A handler that calls back into the engine (the binder driver runs such a
-// call on the notifying thread) while another client thread releases: the
-// release waits for the notification, the handler's call does not wait for
-// the release.
-TEST_F(ClientFaultTest, AHandlerCallingBackIsAnsweredWhileAReleaseWaitsForIt) {
-    send(kSetCallback, {}, gatedClient());
-    startMedia();
-    auto notified = onThread([] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); });
-    ASSERT_TRUE(handlerInside());
-    auto released = onThread([this] { return send(kRelease); });
-    // The camera closing is the release's last step before it waits for the notification.
-    ASSERT_TRUE(eventually([] { return hostfakes::openCameras().empty(); }));
-    auto nested = onThread([] { return enginetest::call(kOrientation, {90, 0, 1}).status; });
-    ASSERT_TRUE(finishes(nested));
-    EXPECT_EQ(NO_ERROR, nested.get());
-    EXPECT_EQ(1u, count("setDisplayOrientation, device: 0 -> 90, screen: 0 -> 0, auto_rotate: 1 -> 1"));
-    EXPECT_EQ(0u, count("release X"));
-    openGate();
-    ASSERT_TRUE(finishes(notified) && finishes(released));
-    EXPECT_EQ(1u, count("release X"));
 }
 
 // The handler answers the event with a request of its own, which the binder
@@ -266,13 +264,16 @@ TEST_F(ClientFaultTest, AHandlerChangingTheCallbackWhileNotifiedIsAnswered) {
         ASSERT_TRUE(handlerInside());
         log.clear();
         std::future<bool> other;
+        const sp<RemoteBinder> otherClient = enginetest::remoteCallback();
         if (c.other == kDeath) {
             other = onThread([&] { return client->kill(); });
             ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kServiceTag, kDied));
         } else if (c.other != kNothing) {
-            other = onThread([&] { return send(c.other, {}, enginetest::remoteCallback()) == 0; });
+            other = onThread([&] { return send(c.other, {}, otherClient) == 0; });
             ASSERT_TRUE(eventually([&] { return !log.linesWithTag(kServiceTag).empty(); }));
         }
+        // The other thread's change waits for the notification in progress.
+        EXPECT_FALSE(other.valid() && other.wait_for(0s) == std::future_status::ready);
         openGate();
         ASSERT_TRUE(finishes(notified)) << "the nested request never came back";
         EXPECT_EQ(0, notified.get());
@@ -281,6 +282,7 @@ TEST_F(ClientFaultTest, AHandlerChangingTheCallbackWhileNotifiedIsAnswered) {
         if (other.valid()) {
             ASSERT_TRUE(finishes(other));
             EXPECT_TRUE(other.get());
+            EXPECT_EQ(Strings{}, received(*otherClient));  // the notification was not repeated to it
             continue;
         }
         // Alone, the handler's request has its whole effect.

@@ -50,17 +50,13 @@ std::string field(const std::string& text, const std::string& heading, const std
     return "(no " + key + ")";
 }
 
-vtspcodec::StreamCommand streamCommand(int32_t code, uint32_t streamId, uint32_t dir, uint16_t remotePort) {
-    vtspcodec::StreamCommand c;
-    c.code = code;
-    c.streamId = streamId;
-    c.dir = dir;
-    c.localAddr = vtspcodec::address("10.0.0.1", 6000);
-    c.remoteAddr = vtspcodec::address("192.168.1.2", remotePort);
+// The call's commands carry its bandwidth and the orientation extension.
+void modemSends(int32_t code, uint32_t streamId, uint32_t dir = VTSP_STREAM_DIR_SENDRECV, uint16_t remotePort = 5000) {
+    vtspcodec::StreamCommand c = streamCommand(code, streamId, dir, remotePort);
     c.localVideoAsBwKbps = 500;
     c.extmapId = 3;
     c.extmapUri = kOrientationUri;
-    return c;
+    enginecase::modemSends(c);
 }
 
 class DumpTest : public EngineCase {
@@ -95,8 +91,7 @@ TEST_F(DumpTest, SectionsFollowACallThroughStartModifyEndAndRelease) {
                        "  hidden image: \"/data/vce/hold.png\"", "  uplink qos: 0 bit/s", "  loopback: off, stream 0"}),
               section(dump({"--engine"}), "engine:"));
 
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_START, 7, VTSP_STREAM_DIR_SENDRECV, 5000)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_START, 7);
     VPR_Comm bind{};
     ASSERT_TRUE(enginetest::modem().readRecord(&bind));
     handled(1);
@@ -112,12 +107,10 @@ TEST_F(DumpTest, SectionsFollowACallThroughStartModifyEndAndRelease) {
                           "    orientation extension: id 3",
                           "    processing starts: 1",
                           "    capture: \"Camera 1, Facing front, Orientation 270\", render: \"Remote\""};
-    const std::string all = dump();
-    EXPECT_EQ(started, section(all, "streams:"));
+    EXPECT_EQ(started, section(dump(), "streams:"));
 
     // A modify to send-only with a new remote port.
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_MODITY, 7, VTSP_STREAM_DIR_SENDONLY, 5002)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_MODITY, 7, VTSP_STREAM_DIR_SENDONLY, 5002);
     handled(2);
     Strings modified = started;
     modified[3] = "    direction: sendonly (1)";
@@ -125,8 +118,7 @@ TEST_F(DumpTest, SectionsFollowACallThroughStartModifyEndAndRelease) {
     EXPECT_EQ(modified, section(dump({"--streams"}), "streams:"));
 
     // A second stream's commands leave the first one's entry as it was.
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_START, 8, VTSP_STREAM_DIR_SENDRECV, 5004)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_START, 8, VTSP_STREAM_DIR_SENDRECV, 5004);
     ASSERT_TRUE(enginetest::modem().readRecord(&bind));
     handled(3);
     const Strings two = section(dump({"--streams"}), "streams:");
@@ -135,10 +127,7 @@ TEST_F(DumpTest, SectionsFollowACallThroughStartModifyEndAndRelease) {
     EXPECT_EQ(Strings(modified.begin() + 1, modified.end()), Strings(two.begin() + 1, two.begin() + modified.size()));
     EXPECT_EQ("  stream 8:", two[modified.size()]);
 
-    for (uint32_t id : {8u, 7u}) {
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(
-                streamCommand(_VTSP_CMD_STREAM_VIDEO_END, id, VTSP_STREAM_DIR_SENDRECV, 5002)));
-    }
+    for (uint32_t id : {8u, 7u}) modemSends(_VTSP_CMD_STREAM_VIDEO_END, id);
     handled(5);
     EXPECT_EQ((Strings{"streams: 0"}), section(dump({"--streams"}), "streams:"));
     const Strings history = section(dump({"--history"}), "recent commands:");
@@ -192,21 +181,18 @@ TEST_F(DumpTest, ArgumentsSelectSectionsAndOnlyPermittedCallersRead) {
 TEST_F(DumpTest, LinkCountersShowFailuresRetriesAndRefusedCommands) {
     VtspManager& vm = *engine()->mVtspManager;
     const int device = vm.mFd;
-    const int readWrite = open(enginetest::modem().devicePath(), O_RDWR | O_NOCTTY);
-    const int readOnly = open(enginetest::modem().devicePath(), O_RDONLY | O_NOCTTY);
-    const int writeOnly = open(enginetest::modem().devicePath(), O_WRONLY | O_NOCTTY);
-    ASSERT_GE(readWrite, 0);
-    ASSERT_GE(readOnly, 0);
-    ASSERT_GE(writeOnly, 0);
+    const char* path = enginetest::modem().devicePath();
+    const int readWrite = open(path, O_RDWR | O_NOCTTY), readOnly = open(path, O_RDONLY | O_NOCTTY),
+              writeOnly = open(path, O_WRONLY | O_NOCTTY);
+    ASSERT_TRUE(readWrite >= 0 && readOnly >= 0 && writeOnly >= 0);
     const std::string link = "modem link:";
-    EXPECT_EQ("  device: " + std::string(enginetest::modem().devicePath()) + ", open", field(dump(), link, "  device:"));
+    EXPECT_EQ("  device: " + std::string(path) + ", open", field(dump(), link, "  device:"));
     EXPECT_EQ("  threads: tVtspCmdRx running, tVtspCmdHd running, tVtspCmdTx running",
               field(dump(), link, "  threads:"));
 
     // A start whose bind request cannot be written at first.
     ASSERT_EQ(device, dup2(readOnly, device));
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_START, 1, VTSP_STREAM_DIR_SENDRECV, 5000)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_START, 1);
     ASSERT_TRUE(eventually([&] { return field(dump(), link, "  written:").find(" 0 failures") == std::string::npos; }));
     ASSERT_EQ(device, dup2(readWrite, device));
     VPR_Comm bind{};
@@ -219,20 +205,15 @@ TEST_F(DumpTest, LinkCountersShowFailuresRetriesAndRefusedCommands) {
     // Two commands while stopped, then reads that fail: the read in progress
     // keeps the old descriptor and takes the first record after the swap.
     vm.stop();
-    for (uint32_t id : {2u, 3u}) {
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(
-                streamCommand(_VTSP_CMD_STREAM_VIDEO_END, id, VTSP_STREAM_DIR_SENDRECV, 5000)));
-    }
+    for (uint32_t id : {2u, 3u}) modemSends(_VTSP_CMD_STREAM_VIDEO_END, id);
     ASSERT_TRUE(eventually([&] { return field(dump(), link, "  refused") == "  refused while stopped: 2 commands, 0 replies"; }))
             << dump({"--link"});
     vm.start();
     ASSERT_EQ(device, dup2(writeOnly, device));
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_END, 4, VTSP_STREAM_DIR_SENDRECV, 5000)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_END, 4);
     ASSERT_TRUE(eventually([&] { return field(dump(), link, "  read:").find(" 0 failures") == std::string::npos; }));
     ASSERT_EQ(device, dup2(readWrite, device));
-    enginetest::modem().writeRecord(vtspcodec::streamRecord(
-            streamCommand(_VTSP_CMD_STREAM_VIDEO_END, 5, VTSP_STREAM_DIR_SENDRECV, 5000)));
+    modemSends(_VTSP_CMD_STREAM_VIDEO_END, 5);
     handled(3);  // the start and the two ends accepted while running
 
     const std::string text = dump({"--link"});
@@ -244,17 +225,12 @@ TEST_F(DumpTest, LinkCountersShowFailuresRetriesAndRefusedCommands) {
     EXPECT_THAT(field(text, link, "  retries:"), ::testing::MatchesRegex("  retries: [1-9][0-9]*"));
     EXPECT_THAT(field(text, link, "  receive queue:"), ::testing::MatchesRegex("  receive queue: 0 now, [1-9][0-9]* at most"));
     EXPECT_THAT(field(text, link, "  transmit queue:"), ::testing::MatchesRegex("  transmit queue: 0 now, 1 at most"));
-    close(readWrite);
-    close(readOnly);
-    close(writeOnly);
+    for (int fd : {readWrite, readOnly, writeOnly}) close(fd);
 }
 
 TEST_F(DumpTest, HistoryKeepsTheLast32Commands) {
     constexpr uint32_t kCommands = 40;
-    for (uint32_t id = 1; id <= kCommands; ++id) {
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(
-                streamCommand(_VTSP_CMD_STREAM_VIDEO_END, 100 + id, VTSP_STREAM_DIR_SENDRECV, 5000)));
-    }
+    for (uint32_t id = 1; id <= kCommands; ++id) modemSends(_VTSP_CMD_STREAM_VIDEO_END, 100 + id);
     handled(kCommands);
     const Strings history = section(dump({"--history"}), "recent commands:");
     ASSERT_EQ(33u, history.size());

@@ -12,7 +12,6 @@
 
 #include <algorithm>
 #include <chrono>
-#include <cstring>
 #include <initializer_list>
 #include <string>
 #include <thread>
@@ -38,6 +37,8 @@ inline constexpr const char* kFront = "Camera 1, Facing front, Orientation 270";
 inline constexpr const char* kBack = "Camera 0, Facing back, Orientation 90";
 inline constexpr const char* kRemote = "Remote";
 inline constexpr int kFirstHandle = 0x100;
+// The video library's text for a remote picture of 640x480.
+inline constexpr const char* kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 
 // Transaction codes of the service, as the client sends them.
 inline constexpr uint32_t kInit = 0, kSetSurface = 1, kSetCallback = 2, kCleanCallback = 3, kEngineInit = 4,
@@ -63,6 +64,23 @@ inline bool contains(const std::vector<std::string>& all, const std::string& one
     return std::find(all.begin(), all.end(), one) != all.end();
 }
 
+// A command of the modem's for stream `streamId` of a call from 10.0.0.1:6000
+// to 192.168.1.2:`remotePort`.
+inline vtspcodec::StreamCommand streamCommand(int32_t code, uint32_t streamId,
+                                              uint32_t dir = android::VTSP_STREAM_DIR_SENDRECV,
+                                              uint16_t remotePort = 5000) {
+    vtspcodec::StreamCommand c;
+    c.code = code;
+    c.streamId = streamId;
+    c.dir = dir;
+    c.localAddr = vtspcodec::address("10.0.0.1", 6000);
+    c.remoteAddr = vtspcodec::address("192.168.1.2", remotePort);
+    return c;
+}
+inline void modemSends(const vtspcodec::StreamCommand& c) {
+    enginetest::modem().writeRecord(vtspcodec::streamRecord(c));
+}
+
 using enginetest::describe;
 using enginetest::inOrder;
 using enginetest::received;
@@ -73,13 +91,10 @@ protected:
         ASSERT_NE(nullptr, enginetest::service());
         // Every case starts from a released engine in normal mode and sees
         // only its own lines and calls, also when several share a process.
-        const size_t removesBefore = completedRemoves();
+        mRemovesBase = completedRemoves();
         send(kRelease);
         send(kEngineInit, {0});
-        ASSERT_TRUE(eventually([&] {
-            return completedRemoves() >=
-                   removesBefore + log.count(ANDROID_LOG_INFO, kEngineTag, "removeRender");
-        }));
+        settleRemovals();
         hostfakes::setNextCameraHandle(kFirstHandle);
         hostfakes::setNextMvdStreamId(1);
         log.clear();
@@ -181,25 +196,15 @@ protected:
     // Plays the modem: starts a send-and-receive stream and waits for its
     // bind request, which the link sends once the stream is configured.
     void startStream(uint32_t streamId) {
-        vtspcodec::StreamCommand start;
-        start.code = android::_VTSP_CMD_STREAM_VIDEO_START;
-        start.streamId = streamId;
-        start.dir = android::VTSP_STREAM_DIR_SENDRECV;
-        start.localAddr = vtspcodec::address("10.0.0.1", 6000);
-        start.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(start));
+        modemSends(streamCommand(android::_VTSP_CMD_STREAM_VIDEO_START, streamId));
         android::VPR_Comm record{};  // the bind request's fields are the link's tests' concern
         ASSERT_TRUE(enginetest::modem().readRecord(&record)) << "no bind request";
         EXPECT_EQ(android::VPR_NET_CMD_BIND, vtspcodec::readBindRequest(record).code);
     }
     // Ends it; the engine stream `mvdStream` is then closed.
     void endStream(uint32_t streamId, unsigned int mvdStream) {
-        vtspcodec::StreamCommand end;
-        end.code = android::_VTSP_CMD_STREAM_VIDEO_END;
-        end.streamId = streamId;
-        end.dir = android::VTSP_STREAM_DIR_SENDRECV;
         const size_t from = hostfakes::callCount();
-        enginetest::modem().writeRecord(vtspcodec::streamRecord(end));
+        modemSends(streamCommand(android::_VTSP_CMD_STREAM_VIDEO_END, streamId));
         const std::string closed = "Mvd_Close(" + std::to_string(mvdStream) + ") = 0";
         EXPECT_TRUE(eventually([&] { return contains(hostfakes::callTextsSince(from), closed); })) << closed;
     }
@@ -241,10 +246,8 @@ protected:
     Strings linesOf(const char* tag) const {
         Strings out;
         for (const LogLine& l : log.linesWithTag(tag)) {
-            out.push_back((l.priority == ANDROID_LOG_INFO    ? "I "
-                           : l.priority == ANDROID_LOG_ERROR ? "E "
-                                                             : "? ") +
-                          l.text);
+            const char* p = l.priority == ANDROID_LOG_INFO ? "I " : l.priority == ANDROID_LOG_ERROR ? "E " : "? ";
+            out.push_back(p + l.text);
         }
         return out;
     }

@@ -40,12 +40,63 @@ class ServiceTest : public FreshServiceCase {};
 
 }  // namespace
 
-TEST_F(ServiceTest, InstantiateRegistersTheServiceAndStartsTheEngineOnce) {
+// The registration starts the engine once. The engine held by each service
+// object outlives any one of them but not the last, which unregisters it from
+// everything that delivers events.
+TEST_F(ServiceTest, TheEngineStartsOnceAndLivesWhileAnyServiceObjectDoesAndStartsAgainAfter) {
     ASSERT_NE(nullptr, service);
     EXPECT_EQ(service, defaultServiceManager()->checkService(kServiceName));
     EXPECT_EQ((Strings{"I Instantiate", "I create", "I Instantiate, ret = 0"}), linesOf(kServiceTag));
     EXPECT_EQ((Strings{"I Create new Instance", "I Construct", "I loadZmf"}), linesOf(kEngineTag));
     EXPECT_EQ(kEngineStart, hostfakes::callTexts());
+
+    // A service object made and dropped at once, as a failed registration does.
+    mark();
+    { sp<VideoCallEngineService> transient = new VideoCallEngineService(); }
+    EXPECT_EQ((Strings{"I create", "I destory"}), linesOf(kServiceTag));
+    EXPECT_THAT(linesOf(kEngineTag), Not(Contains("I Destruct")));
+
+    // A second registration replaces the first object under the same name;
+    // the first goes with its last reference, the engine stays.
+    EXPECT_EQ(NO_ERROR, VideoCallEngineService::instantiate());
+    sp<IBinder> second = defaultServiceManager()->checkService(kServiceName);
+    EXPECT_NE(service, second);
+    mark();
+    service.clear();
+    EXPECT_EQ(Strings{"I destory"}, linesOf(kServiceTag));
+    EXPECT_EQ(Strings{}, linesOf(kEngineTag));
+    EXPECT_EQ(Strings{}, calls());
+
+    // The registered object drives the engine, its events still arrive, and
+    // it watches the client it was given.
+    sp<hostbinder::RemoteBinder> client = enginetest::remoteCallback();
+    EXPECT_EQ(answer(0), show(call(kSetCallback, {}, client)));
+    mmeEvent(22);
+    EXPECT_EQ(1u, client->transactionCount());
+    client->kill();
+    EXPECT_THAT(linesOf(kServiceTag), Contains("I binderDied, ims app died"));
+    EXPECT_THAT(linesOf(kEngineTag), Contains("I release X"));
+
+    // Replacing the registration with an unrelated binder drops the last service object.
+    mark();
+    ASSERT_EQ(NO_ERROR, defaultServiceManager()->addService(kServiceName, new BBinder()));
+    second.clear();
+    EXPECT_EQ(Strings{"I destory"}, linesOf(kServiceTag));
+    EXPECT_THAT(linesOf(kEngineTag), Contains("I Destruct"));
+    EXPECT_EQ((Strings{"camdrvTerm() = 0", "renderTerm() = 0", "Zmf_VideoSetListener(NULL) = 0",
+                       "Zmf_OnTerminate() = 0"}),
+              calls());
+    EXPECT_EQ(nullptr, m_pMmeEventObserver.load());
+
+    // The next registration starts a new engine, whose events arrive.
+    mark();
+    EXPECT_EQ(NO_ERROR, VideoCallEngineService::instantiate());
+    EXPECT_THAT(linesOf(kEngineTag), Contains("I Create new Instance"));
+    EXPECT_EQ(kEngineStart, calls());
+    client = enginetest::remoteCallback();
+    EXPECT_EQ(answer(0), show(call(kSetCallback, {}, client)));
+    mmeEvent(23);
+    EXPECT_EQ(1u, client->transactionCount());
 }
 
 // One request per row, in this order on one engine. Rows that reach no
@@ -155,62 +206,9 @@ TEST_F(ServiceTest, OtherCodesGetThePlatformsDefaultHandling) {
     }
     // The default handling is the base's, which knows the interface query:
     // the service has no descriptor of its own.
-    Parcel empty;
-    Parcel reply;
+    Parcel empty, reply;
     EXPECT_EQ(NO_ERROR, service->transact(IBinder::INTERFACE_TRANSACTION, empty, &reply));
     EXPECT_EQ(String16(), reply.readString16());
-}
-
-// Covers the engine held by each service object: it outlives any one of them
-// but not the last, which unregisters it from everything that delivers events.
-TEST_F(ServiceTest, TheEngineLivesWhileAnyServiceObjectDoesAndStartsAgainAfter) {
-    // A service object made and dropped at once, as a failed registration does.
-    mark();
-    { sp<VideoCallEngineService> transient = new VideoCallEngineService(); }
-    EXPECT_EQ((Strings{"I create", "I destory"}), linesOf(kServiceTag));
-    EXPECT_THAT(linesOf(kEngineTag), Not(Contains("I Destruct")));
-
-    // A second registration replaces the first object under the same name;
-    // the first goes with its last reference, the engine stays.
-    EXPECT_EQ(NO_ERROR, VideoCallEngineService::instantiate());
-    sp<IBinder> second = defaultServiceManager()->checkService(kServiceName);
-    EXPECT_NE(service, second);
-    mark();
-    service.clear();
-    EXPECT_EQ(Strings{"I destory"}, linesOf(kServiceTag));
-    EXPECT_EQ(Strings{}, linesOf(kEngineTag));
-    EXPECT_EQ(Strings{}, calls());
-
-    // The registered object drives the engine, its events still arrive, and
-    // it watches the client it was given.
-    sp<hostbinder::RemoteBinder> client = enginetest::remoteCallback();
-    EXPECT_EQ(answer(0), show(call(kSetCallback, {}, client)));
-    mmeEvent(22);
-    EXPECT_EQ(1u, client->transactionCount());
-    client->kill();
-    EXPECT_THAT(linesOf(kServiceTag), Contains("I binderDied, ims app died"));
-    EXPECT_THAT(linesOf(kEngineTag), Contains("I release X"));
-
-    // Replacing the registration with an unrelated binder drops the last service object.
-    mark();
-    ASSERT_EQ(NO_ERROR, defaultServiceManager()->addService(kServiceName, new BBinder()));
-    second.clear();
-    EXPECT_EQ(Strings{"I destory"}, linesOf(kServiceTag));
-    EXPECT_THAT(linesOf(kEngineTag), Contains("I Destruct"));
-    EXPECT_EQ((Strings{"camdrvTerm() = 0", "renderTerm() = 0", "Zmf_VideoSetListener(NULL) = 0",
-                       "Zmf_OnTerminate() = 0"}),
-              calls());
-    EXPECT_EQ(nullptr, m_pMmeEventObserver.load());
-
-    // The next registration starts a new engine, whose events arrive.
-    mark();
-    EXPECT_EQ(NO_ERROR, VideoCallEngineService::instantiate());
-    EXPECT_THAT(linesOf(kEngineTag), Contains("I Create new Instance"));
-    EXPECT_EQ(kEngineStart, calls());
-    client = enginetest::remoteCallback();
-    EXPECT_EQ(answer(0), show(call(kSetCallback, {}, client)));
-    mmeEvent(23);
-    EXPECT_EQ(1u, client->transactionCount());
 }
 
 // An event already inside the engine when the last service object goes: the
@@ -219,16 +217,11 @@ TEST_F(ServiceTest, TheEngineOutlivesTheEventsInsideItWhenItIsDeleted) {
     ASSERT_EQ(0, Mvd_EvntSetCallback(Mvd_EvntProc, 1));
     const struct {
         const char* entered;  // the engine's first line for the event
-        int (*deliver)();
+        bool (*deliver)();
     } paths[] = {
-            {"mmeEvtUpdate evt: 22", [] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}); }},
+            {"mmeEvtUpdate evt: 22", [] { return hostfakes::fireMvdEvent(tagMVD_EVNT{{22}}) == 0; }},
             {"zmfRenderEvtUpdate, evt:28 [Remote], type 0, [640x480]",
-             [] {
-                 return hostfakes::fireZmfEvent(
-                                27, R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})")
-                                ? 0
-                                : -1;
-             }},
+             [] { return hostfakes::fireZmfEvent(27, kRemoteSize); }},
     };
     for (const auto& path : paths) {
         SCOPED_TRACE(path.entered);
@@ -244,7 +237,7 @@ TEST_F(ServiceTest, TheEngineOutlivesTheEventsInsideItWhenItIsDeleted) {
         ASSERT_TRUE(log.waitFor(ANDROID_LOG_INFO, kEngineTag, "Destruct"));
         deleted.wait_for(std::chrono::milliseconds(300));  // room for a deletion that does not wait
         log.letGo();
-        EXPECT_EQ(0, event.get());
+        EXPECT_TRUE(event.get());
         deleted.get();
         Strings order;
         for (const LogLine& line : log.lines()) order.push_back(line.text);

@@ -4,7 +4,6 @@
 // own threads, while dumpsys reads the service. Each side counts what it did: every request must be answered,
 // every stream start get exactly one bind request, and every event reach the
 // client, or be dropped for want of a callback, exactly once.
-#include <atomic>
 #include <map>
 
 #include "EngineTestUtil.h"
@@ -24,7 +23,6 @@ constexpr auto kLoadTime = 1500ms;  // each thread starts rounds until then, at 
 constexpr auto kPause = 1ms;        // between a thread's rounds, so no side swamps the log and call record
 constexpr auto kWatchdog = 60s;     // far beyond any round, also under TSan on a busy machine
 constexpr int kClients = 4;
-const char* const kRemoteSize = R"({"Render":"Remote","SourceType":0,"Window":1,"Width":640,"Height":480})";
 const std::string kSent = "BpVideoCallEngineCallback notifyCallback";
 
 // One client thread's rounds, and the first answer other than int32 0 with status 0.
@@ -85,13 +83,11 @@ TEST_F(StressTest, ClientsModemAndMediaAtOnceLoseAndDuplicateNothing) {
     int starts = 0, binds = 0;
     std::string badBind;
     load.run([&] {
-        vtspcodec::StreamCommand c;
-        c.streamId = 1000;
-        c.remoteAddr = vtspcodec::address("192.168.1.2", 5000);
+        vtspcodec::StreamCommand c = streamCommand(_VTSP_CMD_STREAM_VIDEO_START, 1000);
         auto write = [&](int32_t code, uint32_t dir) {
             c.code = code;
             c.dir = dir;
-            enginetest::modem().writeRecord(vtspcodec::streamRecord(c));
+            modemSends(c);
         };
         do {
             ++c.streamId;
