@@ -112,6 +112,10 @@ int renderRemove(const char* pcRenderId) {
             }
         }
     }
+    // A library's remove has let the surface go by the time it returns, and
+    // the call is on record only from then on: a test that saw the call
+    // complete must not find the surface still alive.
+    released.clear();
     const int result = recordCall("renderRemove", {argText(pcRenderId)});
     {
         std::lock_guard<std::mutex> lock(r.stateMutex());
