@@ -8,6 +8,7 @@
 #include <sstream>
 #include <thread>
 
+#include "CallbackTracker.h"
 #include "HostFakes.h"
 #include "Simulator.h"
 
@@ -78,4 +79,40 @@ TEST(SimulatorInvariants, ALateBindRequestIsNotALostOne) {
     });
     EXPECT_EQ("", simulator.step(scenario.steps()[0])) << out.str();
     answer.join();
+}
+
+// The callback invariant's account of which callbacks the engine may still
+// notify, through the interleavings several client threads make.
+TEST(SimulatorInvariants, ACallbackIsRetiredOnlyByAChangeIssuedAfterItsRegistrationReturned) {
+    CallbackTracker callbacks;
+    const int first = callbacks.registering();
+    const CallbackTracker::Change none = callbacks.changeIssued();
+    callbacks.registered(first);
+    callbacks.changeReturned(none);
+    EXPECT_FALSE(callbacks.retired(first));
+
+    // A registration sent while a notification of the first is in progress
+    // waits for it; the handler clears the callback meanwhile, and the
+    // engine takes that clear first.
+    const int second = callbacks.registering();
+    const CallbackTracker::Change replaced = callbacks.changeIssued();
+    const CallbackTracker::Change cleared = callbacks.changeIssued();
+    callbacks.changeReturned(cleared);
+    EXPECT_TRUE(callbacks.retired(first));
+    callbacks.registered(second);
+    callbacks.changeReturned(replaced);
+    EXPECT_FALSE(callbacks.retired(second));
+
+    // Until a release returns, the callback it drops may still be notified.
+    const CallbackTracker::Change released = callbacks.changeIssued();
+    EXPECT_FALSE(callbacks.retired(second));
+    callbacks.changeReturned(released);
+    EXPECT_TRUE(callbacks.retired(second));
+
+    // A dead binder is retired at once, a registration still in flight is not.
+    const int third = callbacks.registering(), fourth = callbacks.registering();
+    callbacks.registered(third);
+    callbacks.died(third);
+    EXPECT_TRUE(callbacks.retired(third));
+    EXPECT_FALSE(callbacks.retired(fourth));
 }

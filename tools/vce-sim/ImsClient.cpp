@@ -73,9 +73,17 @@ void ImsClient::transact(uint32_t code, const std::string& label, const std::vec
     for (int32_t v : ints) request.writeInt32(v);
     if (binder != nullptr) request.writeStrongBinder(binder);
     if (text != nullptr) request.writeCString(text);
-    if (binder == nullptr) mPreviousCallback.store(mCurrentCallback.load());
+    // Without a binder, SET_CALLBACK clears the callback as CLEAN_CALLBACK
+    // does; RELEASE drops it too. With one, setCallback keeps the account.
+    const bool dropsCallback = binder == nullptr && (code == VideoCallEngineService::VCE_ACTION_SET_CALLBACK ||
+                                                     code == VideoCallEngineService::VCE_ACTION_CLEAN_CALLBACK ||
+                                                     code == VideoCallEngineService::VCE_ACTION_RELEASE);
+    const CallbackTracker::Change change = dropsCallback ? mCallbacks.changeIssued() : CallbackTracker::Change{};
     const status_t status = mService->transact(code, request, &reply);
-    if (binder == nullptr) noteCallbackChange(code);
+    if (dropsCallback) {
+        mCallbacks.changeReturned(change);
+        mCurrentCallback.store(0);
+    }
     reply.setDataPosition(0);
     const int32_t answer = reply.readInt32();
     mLastReply.store(answer);
@@ -112,31 +120,21 @@ void ImsClient::perform(const ScenarioStep& step) {
 }
 
 void ImsClient::setCallback(int32_t reentrantCode) {
-    const int generation = ++mCallbackGeneration;
+    const int number = mCallbacks.registering();
+    mCallbackNumber = number;
     mCallback = new RemoteBinder(
-            [this, generation, reentrantCode](uint32_t code, const Parcel& data, Parcel* reply, uint32_t) {
-                return receive(code, data, reply, generation, reentrantCode);
+            [this, number, reentrantCode](uint32_t code, const Parcel& data, Parcel* reply, uint32_t) {
+                return receive(code, data, reply, number, reentrantCode);
             },
             android::String16("android.videocallengine.callback"));
-    // While the engine swaps callbacks, an event may still reach the old one.
-    mPreviousCallback.store(mCurrentCallback.load());
-    mCurrentCallback.store(generation);
+    mCurrentCallback.store(number);
+    const CallbackTracker::Change replaced = mCallbacks.changeIssued();
     transact(VideoCallEngineService::VCE_ACTION_SET_CALLBACK,
              reentrantCode < 0 ? "SET_CALLBACK" : "SET_CALLBACK (answers events with code " +
                                                           std::to_string(reentrantCode) + ")",
              {}, mCallback);
-    mPreviousCallback.store(0);
-}
-
-void ImsClient::noteCallbackChange(uint32_t code) {
-    // Without a binder, SET_CALLBACK clears the callback as CLEAN_CALLBACK
-    // does; RELEASE drops it too.
-    if (code == VideoCallEngineService::VCE_ACTION_SET_CALLBACK ||
-        code == VideoCallEngineService::VCE_ACTION_CLEAN_CALLBACK ||
-        code == VideoCallEngineService::VCE_ACTION_RELEASE) {
-        mCurrentCallback.store(0);
-    }
-    mPreviousCallback.store(0);
+    mCallbacks.registered(number);
+    mCallbacks.changeReturned(replaced);
 }
 
 void ImsClient::setSurface(const ScenarioStep& step) {
@@ -148,12 +146,15 @@ void ImsClient::setSurface(const ScenarioStep& step) {
 void ImsClient::die() {
     show("x  process dies (callback binder killed)", "client", "vce");
     mCurrentCallback.store(0);
-    if (mCallback != nullptr) mCallback->kill();
+    if (mCallback == nullptr) return;
+    // Killed first: an event already inside the handler was sent in time.
+    mCallback->kill();
+    mCallbacks.died(mCallbackNumber);
 }
 
-status_t ImsClient::receive(uint32_t code, const Parcel& data, Parcel* reply, int generation,
+status_t ImsClient::receive(uint32_t code, const Parcel& data, Parcel* reply, int callback,
                            int32_t reentrantCode) {
-    if (generation != mCurrentCallback.load() && generation != mPreviousCallback.load()) mStaleEvents.fetch_add(1);
+    if (mCallbacks.retired(callback)) mStaleEvents.fetch_add(1);
     Event event;
     event.event = data.readInt32();
     if (code == 1) {

@@ -14,6 +14,7 @@
 #include <string>
 #include <vector>
 
+#include "CallbackTracker.h"
 #include "RemoteBinder.h"
 #include "Scenario.h"
 #include "Timeline.h"
@@ -48,11 +49,9 @@ private:
     void transact(uint32_t code, const std::string& label, const std::vector<int32_t>& ints,
                   const android::sp<android::IBinder>& binder = nullptr, const char* text = nullptr);
     void setCallback(int32_t reentrantCode = -1);
-    // What a transaction of `code` does to the registered callback.
-    void noteCallbackChange(uint32_t code);
     void setSurface(const ScenarioStep& step);
     void die();
-    android::status_t receive(uint32_t code, const android::Parcel& data, android::Parcel* reply, int generation,
+    android::status_t receive(uint32_t code, const android::Parcel& data, android::Parcel* reply, int callback,
                               int32_t reentrantCode);
     void show(const std::string& text, const std::string& mscFrom, const std::string& mscTo,
               const std::string& target = "");
@@ -64,9 +63,9 @@ private:
     std::atomic<int32_t> mLastReply{0};  // a handler may transact from the notifying thread
     mutable std::mutex mLock;
     std::vector<Event> mEvents;
-    std::atomic<int> mCurrentCallback{0};  // generation of the registered callback; 0 none
-    std::atomic<int> mPreviousCallback{0};  // still allowed while a callback change is in flight
-    int mCallbackGeneration = 0;
+    std::atomic<int> mCurrentCallback{0};  // the callback last registered, as this client saw it; 0 none
+    int mCallbackNumber = 0;                // the one mCallback is
+    CallbackTracker mCallbacks;
     std::atomic<size_t> mStaleEvents{0};
 };
 
