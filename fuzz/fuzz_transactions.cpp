@@ -23,6 +23,18 @@ VideoCallEngineService* theService() {
     return service.get();
 }
 
+// libbinder's dump reader adds an empty argument for every count it cannot
+// read, so a count of a billion costs gigabytes before the service sees a
+// single argument: the platform's own loop, the same on a handset, where
+// only the privileged dumpsys sends this transaction.
+bool dumpArgumentsBeyondTheBytes(const Parcel& request) {
+    request.readFileDescriptor();
+    const int32_t argc = request.readInt32();
+    const bool beyond = argc > 0 && static_cast<size_t>(argc) > request.dataAvail() / sizeof(int32_t);
+    request.setDataPosition(0);
+    return beyond;
+}
+
 }  // namespace
 
 extern "C" int LLVMFuzzerInitialize(int* /*argc*/, char*** /*argv*/) {
@@ -41,6 +53,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t* data, size_t size) {
     std::memcpy(&code, data, sizeof(code));
     Parcel request;
     request.setData(data + 4, size - 4);
+    if (code == IBinder::DUMP_TRANSACTION && dumpArgumentsBeyondTheBytes(request)) return 0;
     Parcel reply;
     hostfakes::reset();
     theService()->onTransact(code, request, &reply, 0);

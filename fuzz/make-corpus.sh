@@ -54,6 +54,9 @@ t silent 18
 t unknown 99 1 2 3
 { words 16 1; printf '/sdcard/img.jpg\0'; } > "$C"/transactions/hide-image
 words 16 0 > "$C"/transactions/show-image
+# A dump whose argument count runs past its bytes: the platform's own reader
+# would add a billion empty arguments, so the target skips it.
+{ words 0x5f444d50 0x444d5006; printf '_\0'; } > "$C"/transactions/dump-count-past-the-bytes
 
 # zmf_events: an event number, then the JSON text the library sends.
 z() { local name=$1 event=$2 json=$3; { words "$event"; printf '%s' "$json"; } > "$C/zmf_events/$name"; }
