@@ -102,12 +102,14 @@ TEST(SimulatorInvariants, ACallbackIsRetiredOnlyByAChangeIssuedAfterItsRegistrat
     callbacks.registered(second);
     callbacks.changeReturned(replaced);
     EXPECT_FALSE(callbacks.retired(second));
+    EXPECT_TRUE(callbacks.anyRegistered());
 
     // Until a release returns, the callback it drops may still be notified.
     const CallbackTracker::Change released = callbacks.changeIssued();
     EXPECT_FALSE(callbacks.retired(second));
     callbacks.changeReturned(released);
     EXPECT_TRUE(callbacks.retired(second));
+    EXPECT_FALSE(callbacks.anyRegistered());
 
     // A dead binder is retired at once, a registration still in flight is not.
     const int third = callbacks.registering(), fourth = callbacks.registering();

@@ -33,3 +33,8 @@ bool CallbackTracker::retired(int callback) const {
     std::lock_guard<std::mutex> lock(mLock);
     return mRetired.count(callback) != 0;
 }
+
+bool CallbackTracker::anyRegistered() const {
+    std::lock_guard<std::mutex> lock(mLock);
+    return !mRegistered.empty();
+}

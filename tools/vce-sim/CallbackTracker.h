@@ -30,6 +30,8 @@ public:
     // The callback's binder is dead: nothing can reach it any more.
     void died(int callback);
     bool retired(int callback) const;
+    // A registration has returned and nothing has taken it away since.
+    bool anyRegistered() const;
 
 private:
     mutable std::mutex mLock;

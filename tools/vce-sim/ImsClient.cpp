@@ -80,10 +80,7 @@ void ImsClient::transact(uint32_t code, const std::string& label, const std::vec
                                                      code == VideoCallEngineService::VCE_ACTION_RELEASE);
     const CallbackTracker::Change change = dropsCallback ? mCallbacks.changeIssued() : CallbackTracker::Change{};
     const status_t status = mService->transact(code, request, &reply);
-    if (dropsCallback) {
-        mCallbacks.changeReturned(change);
-        mCurrentCallback.store(0);
-    }
+    if (dropsCallback) mCallbacks.changeReturned(change);
     reply.setDataPosition(0);
     const int32_t answer = reply.readInt32();
     mLastReply.store(answer);
@@ -127,7 +124,6 @@ void ImsClient::setCallback(int32_t reentrantCode) {
                 return receive(code, data, reply, number, reentrantCode);
             },
             android::String16("android.videocallengine.callback"));
-    mCurrentCallback.store(number);
     const CallbackTracker::Change replaced = mCallbacks.changeIssued();
     transact(VideoCallEngineService::VCE_ACTION_SET_CALLBACK,
              reentrantCode < 0 ? "SET_CALLBACK" : "SET_CALLBACK (answers events with code " +
@@ -145,7 +141,6 @@ void ImsClient::setSurface(const ScenarioStep& step) {
 
 void ImsClient::die() {
     show("x  process dies (callback binder killed)", "client", "vce");
-    mCurrentCallback.store(0);
     if (mCallback == nullptr) return;
     // Killed first: an event already inside the handler was sent in time.
     mCallback->kill();

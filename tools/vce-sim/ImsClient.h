@@ -41,7 +41,7 @@ public:
     // cleaned or lost with its process: the engine should never send those.
     size_t staleEvents() const { return mStaleEvents.load(); }
     // True while the client believes a callback of its own is registered.
-    bool hasCallback() const { return mCurrentCallback.load() != 0; }
+    bool hasCallback() const { return mCallbacks.anyRegistered(); }
 
     static const char* eventName(int32_t event);
 
@@ -63,7 +63,6 @@ private:
     std::atomic<int32_t> mLastReply{0};  // a handler may transact from the notifying thread
     mutable std::mutex mLock;
     std::vector<Event> mEvents;
-    std::atomic<int> mCurrentCallback{0};  // the callback last registered, as this client saw it; 0 none
     int mCallbackNumber = 0;                // the one mCallback is
     CallbackTracker mCallbacks;
     std::atomic<size_t> mStaleEvents{0};
