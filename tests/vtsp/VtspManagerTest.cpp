@@ -308,18 +308,22 @@ TEST_F(VtspManagerTest, ReplyCutShortByDestroyIsFinishedFirstWhenTheLinkRunsAgai
         return now == before && now < kStarts && threadsNamed("tVtspCmdTx", 'S') == 1;
     }));
     destroyLink();
+    // The pipe can also fill exactly at a record's end: then the reply being
+    // written (counted in `written`) has not begun, is dropped whole, and
+    // nothing is left to finish.
     const std::string cut = "writeToVpr: " + std::string(pty.devicePath()) + " took ";
     const auto lines = log.linesWithTag(kTag);
-    ASSERT_TRUE(std::any_of(lines.begin(), lines.end(), [&](const LogLine& l) { return l.text.rfind(cut, 0) == 0; }));
+    const bool cutShort =
+            std::any_of(lines.begin(), lines.end(), [&](const LogLine& l) { return l.text.rfind(cut, 0) == 0; });
 
     startLink();
     pty.writeRecord(streamRecord(startCommand(kStarts + 1)));
     // Whole records only: every reply written before, the cut one completed,
     // then the new one.
-    for (size_t id = 1; id <= written; ++id) ASSERT_EQ(bindOf(id), readBind());
+    for (size_t id = 1; id <= (cutShort ? written : written - 1); ++id) ASSERT_EQ(bindOf(id), readBind());
     EXPECT_EQ(bindOf(kStarts + 1), readBind());
-    EXPECT_TRUE(log.contains(ANDROID_LOG_INFO, kTag, "writeToVpr: rest of the unfinished record written to " +
-                                                         std::string(pty.devicePath())));
+    EXPECT_EQ(cutShort, log.contains(ANDROID_LOG_INFO, kTag, "writeToVpr: rest of the unfinished record written to " +
+                                                                     std::string(pty.devicePath())));
 }
 
 TEST_F(VtspManagerTest, DeletingARunningLinkEndsItsThreadsFirstAndANeverStartedOneWakesNone) {
