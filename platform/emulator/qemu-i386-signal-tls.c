@@ -225,11 +225,7 @@ __attribute__((constructor)) static void prepareLdt(void) {
     /* qemu gives a thread the LDT only if the table exists when the thread
      * is created: make it now, before the program starts any. */
     struct user_desc desc;
-    describeThread(&desc, 0, 0);
-    desc.limit = 0;
-    desc.seg_32bit = 0;
-    desc.limit_in_pages = 0;
-    desc.useable = 0;
+    memset(&desc, 0, sizeof desc);  /* entry 0 stays empty: the kernel's "clear" form */
     desc.read_exec_only = 1;
     desc.seg_not_present = 1;
     ldtTaken[0] = 1u;
