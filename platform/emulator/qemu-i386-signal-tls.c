@@ -184,7 +184,7 @@ struct Start {
 static void* startThread(void* p) {
     struct Start start = *(struct Start*)p;
     free(p);
-    pthread_setspecific(ldtOwner, &ldtOwner);
+    if (ldtReady) pthread_setspecific(ldtOwner, &ldtOwner);  /* the key exists only then */
     pthread_sigmask(SIG_SETMASK, &start.mask, NULL);
     return start.routine(start.arg);
 }
